@@ -32,8 +32,7 @@ void write(PTPWriteCursor& cursor, Unsigned value) {
 
 std::u16string readUnits(PTPReadCursor& cursor, std::size_t count) {
   std::u16string units;
-  for (std::size_t i = 0; i < count; ++i)
-    units += static_cast<char16_t>(read<std::uint16_t>(cursor));
+  for (std::size_t i = 0; i < count; ++i) units += static_cast<char16_t>(read<std::uint16_t>(cursor));
   return units;
 }
 
@@ -121,8 +120,8 @@ std::u16string CopyUnicodeStringWithLengthByteFromBuffer(PTPReadCursor& cursor) 
   return string;
 }
 
-std::optional<std::u16string> CopyUnicodeStringWithLengthByteFromBufferMaxSize(
-    PTPReadCursor& cursor, PTPReadCursor limit) {
+std::optional<std::u16string> CopyUnicodeStringWithLengthByteFromBufferMaxSize(PTPReadCursor& cursor,
+                                                                               PTPReadCursor limit) {
   if (limit - cursor < *cursor) return std::nullopt;
   return CopyUnicodeStringWithLengthByteFromBuffer(cursor);
 }
@@ -150,12 +149,11 @@ void WriteUnicodeStringToBuffer(PTPWriteCursor& cursor, std::u16string_view stri
 std::vector<std::uint16_t> CopyArrayOfUnsignedShortsFromBuffer(PTPReadCursor& cursor) {
   return readArray<std::uint16_t>(cursor);
 }
-std::optional<std::vector<std::uint16_t>> CopyArrayOfUnsignedShortsFromBufferMaxSize(
-    PTPReadCursor& cursor, PTPReadCursor limit) {
+std::optional<std::vector<std::uint16_t>> CopyArrayOfUnsignedShortsFromBufferMaxSize(PTPReadCursor& cursor,
+                                                                                     PTPReadCursor limit) {
   return readArrayUpTo<std::uint16_t>(cursor, limit);
 }
-void WriteArrayOfUnsignedShortsToBuffer(PTPWriteCursor& cursor,
-                                        const std::vector<std::uint16_t>& array) {
+void WriteArrayOfUnsignedShortsToBuffer(PTPWriteCursor& cursor, const std::vector<std::uint16_t>& array) {
   writeArray(cursor, array);
 }
 
@@ -166,8 +164,7 @@ std::optional<std::vector<std::uint32_t>> CopyArrayOfHandlesFromBufferMaxSize(PT
                                                                               PTPReadCursor limit) {
   auto handles = readArrayUpTo<std::uint32_t>(cursor, limit);
   if (!handles) {
-    OVLogError("ptp",
-               "The camera returned an invalid buffer for object handles; cannot enumerate it.");
+    OVLogError("ptp", "The camera returned an invalid buffer for object handles; cannot enumerate it.");
   }
   return handles;
 }

@@ -52,8 +52,8 @@ std::u16string CopyUnicodeStringWithLengthByteFromBuffer(PTPReadCursor& cursor);
 /// The same, or none with the cursor unmoved when cursor + N is beyond `limit`. The check is that
 /// loose: the count byte itself and up to N + 1 bytes beyond `limit` are read, so the buffer must
 /// be larger than `limit` says.
-std::optional<std::u16string> CopyUnicodeStringWithLengthByteFromBufferMaxSize(
-    PTPReadCursor& cursor, PTPReadCursor limit);
+std::optional<std::u16string> CopyUnicodeStringWithLengthByteFromBufferMaxSize(PTPReadCursor& cursor,
+                                                                               PTPReadCursor limit);
 /// Writes 1 byte for an empty string, else 1 + 2 * (length + 1). The count byte keeps the low 8
 /// bits of length + 1, so that longer strings than 254 units get a count that does not fit them.
 void WriteUnicodeStringWithLengthByteToBuffer(PTPWriteCursor& cursor, std::u16string_view string);
@@ -67,10 +67,9 @@ void WriteUnicodeStringToBuffer(PTPWriteCursor& cursor, std::u16string_view stri
 std::vector<std::uint16_t> CopyArrayOfUnsignedShortsFromBuffer(PTPReadCursor& cursor);
 /// The same, or none with the cursor unmoved when cursor + (C * 2 + 4), in 32-bit arithmetic, is
 /// beyond `limit`. The count itself is read without a check.
-std::optional<std::vector<std::uint16_t>> CopyArrayOfUnsignedShortsFromBufferMaxSize(
-    PTPReadCursor& cursor, PTPReadCursor limit);
-void WriteArrayOfUnsignedShortsToBuffer(PTPWriteCursor& cursor,
-                                        const std::vector<std::uint16_t>& array);
+std::optional<std::vector<std::uint16_t>> CopyArrayOfUnsignedShortsFromBufferMaxSize(PTPReadCursor& cursor,
+                                                                                     PTPReadCursor limit);
+void WriteArrayOfUnsignedShortsToBuffer(PTPWriteCursor& cursor, const std::vector<std::uint16_t>& array);
 
 /// An array of 32-bit object handles: a 32-bit count C and the elements.
 std::vector<std::uint32_t> CopyArrayOfHandlesFromBuffer(PTPReadCursor& cursor);

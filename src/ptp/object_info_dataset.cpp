@@ -70,9 +70,8 @@ Data MSObjectInfoDataset::content() const {
   WriteUInt16(cursor, protectionStatus_);
   WriteUInt64(cursor, objectCompressedSize_);
   WriteUInt16(cursor, thumbFormat_);
-  for (const std::uint32_t field :
-       {thumbCompressedSize_, thumbOffset_, thumbPixWidth_, thumbPixHeight_, imagePixWidth_,
-        imagePixHeight_, imageBitDepth_, parentObject_}) {
+  for (const std::uint32_t field : {thumbCompressedSize_, thumbOffset_, thumbPixWidth_, thumbPixHeight_,
+                                    imagePixWidth_, imagePixHeight_, imageBitDepth_, parentObject_}) {
     WriteUInt32(cursor, field);
   }
   WriteUInt16(cursor, associationType_);

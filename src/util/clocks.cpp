@@ -32,8 +32,7 @@ std::string __OVLogDateString() {
   ::localtime_r(&now.tv_sec, &local);
   // "%06.3ld" of the C library: at least 3 digits, padded with blanks to 6.
   const std::string nanoseconds = fmt::format("{:03}", now.tv_nsec);
-  return fmt::format("{:02}:{:02}:{:02}:{:>6}  ", local.tm_hour, local.tm_min, local.tm_sec,
-                     nanoseconds);
+  return fmt::format("{:02}:{:02}:{:02}:{:>6}  ", local.tm_hour, local.tm_min, local.tm_sec, nanoseconds);
 }
 
 double OVConvertTimebaseToMilliseconds(std::int64_t ticks) {
@@ -48,8 +47,7 @@ void startBenchmark() {
 }
 
 float stopBenchmark() {
-  const float elapsed =
-      static_cast<float>(monotonicTicks()) - benchmarkStart.load(std::memory_order_relaxed);
+  const float elapsed = static_cast<float>(monotonicTicks()) - benchmarkStart.load(std::memory_order_relaxed);
   const float milliseconds = elapsed / 1'000'000.0F;
   benchmarkResult.store(milliseconds, std::memory_order_relaxed);
   return milliseconds;
@@ -58,8 +56,7 @@ float stopBenchmark() {
 float lastBenchmarkResult() { return benchmarkResult.load(std::memory_order_relaxed); }
 
 std::string benchmarkLine(std::string_view label, float milliseconds) {
-  return fmt::format("{}   [{:5.0f} ms] {}", label, milliseconds,
-                     milliseconds > 300 ? "{⊗}" : "{𝚫}");
+  return fmt::format("{}   [{:5.0f} ms] {}", label, milliseconds, milliseconds > 300 ? "{⊗}" : "{𝚫}");
 }
 
 }  // namespace brivo

@@ -19,9 +19,7 @@ void __OVOSLogCreate() {
   std::call_once(once, [] { _gOVOSLog = new UnifiedLog(OVLoggingDomain, processName()); });
 }
 
-unsigned __OVLogTypeEnabled(unsigned mask) {
-  return OVLoggingLevel.load(std::memory_order_relaxed) & mask;
-}
+unsigned __OVLogTypeEnabled(unsigned mask) { return OVLoggingLevel.load(std::memory_order_relaxed) & mask; }
 
 namespace {
 

@@ -37,16 +37,13 @@ void OVWriteLogLine(LogLevel level, std::string_view tag, std::string_view messa
 
 /// A line at the default level. *Thread-safe*, as are all of these.
 template <class... Arguments>
-void OVLog(std::string_view tag, fmt::format_string<Arguments...> format,
-           Arguments&&... arguments) {
-  OVWriteLogLine(LogLevel::standard, tag,
-                 fmt::format(format, std::forward<Arguments>(arguments)...));
+void OVLog(std::string_view tag, fmt::format_string<Arguments...> format, Arguments&&... arguments) {
+  OVWriteLogLine(LogLevel::standard, tag, fmt::format(format, std::forward<Arguments>(arguments)...));
 }
 
 /// A line at the error level.
 template <class... Arguments>
-void OVLogError(std::string_view tag, fmt::format_string<Arguments...> format,
-                Arguments&&... arguments) {
+void OVLogError(std::string_view tag, fmt::format_string<Arguments...> format, Arguments&&... arguments) {
   OVWriteLogLine(LogLevel::error, tag, fmt::format(format, std::forward<Arguments>(arguments)...));
 }
 
@@ -60,8 +57,8 @@ void OVLogVerbose(unsigned mask, std::string_view tag, fmt::format_string<Argume
 
 /// A line at the default level while the verbose class `mask` is on, at the debug level else.
 template <class... Arguments>
-void OVLogVerboseOrDebug(unsigned mask, std::string_view tag,
-                         fmt::format_string<Arguments...> format, Arguments&&... arguments) {
+void OVLogVerboseOrDebug(unsigned mask, std::string_view tag, fmt::format_string<Arguments...> format,
+                         Arguments&&... arguments) {
   __OVOSLogCreate();
   const LogLevel level = __OVLogTypeEnabled(mask) ? LogLevel::standard : LogLevel::debug;
   if (!_gOVOSLog->enabled(level)) return;

@@ -21,9 +21,7 @@ struct Buffer {
   std::array<std::uint8_t, 2048> bytes{};
 
   Buffer() = default;
-  Buffer(std::initializer_list<std::uint8_t> start) {
-    std::copy(start.begin(), start.end(), bytes.begin());
-  }
+  Buffer(std::initializer_list<std::uint8_t> start) { std::copy(start.begin(), start.end(), bytes.begin()); }
 
   PTPReadCursor reading() const { return bytes.data(); }
   PTPWriteCursor writing() { return bytes.data(); }
@@ -62,8 +60,8 @@ TEST(CodecTest, A16BitCheckedReadWithExactly2BytesLeftSucceedsAndWith1DoesNotMov
 
 /// Every checked integer reader at every limit from nothing to more than enough.
 template <class Value>
-void checkAtEveryLimit(Value (*readChecked)(PTPReadCursor&, PTPReadCursor),
-                       Value (*read)(PTPReadCursor&), std::ptrdiff_t width) {
+void checkAtEveryLimit(Value (*readChecked)(PTPReadCursor&, PTPReadCursor), Value (*read)(PTPReadCursor&),
+                       std::ptrdiff_t width) {
   const Buffer buffer{0x81, 0x92, 0xA3, 0xB4, 0xC5, 0xD6, 0xE7, 0xF8};
   PTPReadCursor plain = buffer.reading();
   const Value expected = read(plain);
@@ -162,8 +160,7 @@ TEST(CodecTest, TheCheckedStringReaderComparesTheCountByteItself) {
   const Buffer buffer{3, 'A', 0, 'B', 0, 0, 0};
   for (std::ptrdiff_t limit = 0; limit <= 8; ++limit) {
     PTPReadCursor in = buffer.reading();
-    const auto string =
-        CopyUnicodeStringWithLengthByteFromBufferMaxSize(in, buffer.reading() + limit);
+    const auto string = CopyUnicodeStringWithLengthByteFromBufferMaxSize(in, buffer.reading() + limit);
     if (limit >= 3) {  // and not 7, where the string ends
       EXPECT_EQ(string, u"AB") << limit;
       EXPECT_EQ(in - buffer.reading(), 7);
@@ -226,8 +223,7 @@ TEST(CodecTest, CheckedArrayReadersAtEveryLimit) {
               limit >= 8);
     EXPECT_EQ(in - shorts.reading(), limit >= 8 ? 8 : 0);
     in = handles.reading();
-    EXPECT_EQ(CopyArrayOfHandlesFromBufferMaxSize(in, handles.reading() + limit).has_value(),
-              limit >= 8);
+    EXPECT_EQ(CopyArrayOfHandlesFromBufferMaxSize(in, handles.reading() + limit).has_value(), limit >= 8);
     EXPECT_EQ(in - handles.reading(), limit >= 8 ? 8 : 0);
   }
   EXPECT_THAT(capture.text(), HasSubstr("invalid buffer for object handles"));

@@ -6,15 +6,12 @@
 namespace brivo {
 namespace {
 
-unsigned at(const Data& data, std::size_t offset) {
-  return std::to_integer<unsigned>(data.bytes()[offset]);
-}
+unsigned at(const Data& data, std::size_t offset) { return std::to_integer<unsigned>(data.bytes()[offset]); }
 
 TEST(ObjectInfoDatasetTest, WithoutAFileNameItIs84Bytes) {
   const Data content = MSObjectInfoDataset().content();
   ASSERT_EQ(content.size(), 84u);
-  for (std::size_t i = 0; i < content.size(); ++i)
-    EXPECT_EQ(at(content, i), i == 4 ? 76u : 0u) << i;
+  for (std::size_t i = 0; i < content.size(); ++i) EXPECT_EQ(at(content, i), i == 4 ? 76u : 0u) << i;
 }
 
 TEST(ObjectInfoDatasetTest, NamedDcimItIs94Bytes) {
@@ -82,8 +79,7 @@ TEST(ObjectInfoDatasetTest, EveryFieldSitsAtItsOffset) {
   const Data content = filled().content();
   const auto little = [&](std::size_t offset, std::size_t width) {
     std::uint64_t value = 0;
-    for (std::size_t i = 0; i < width; ++i)
-      value |= std::uint64_t{at(content, offset + i)} << (8 * i);
+    for (std::size_t i = 0; i < width; ++i) value |= std::uint64_t{at(content, offset + i)} << (8 * i);
     return value;
   };
   EXPECT_EQ(little(0, 4), 0x01020304u);
@@ -127,8 +123,7 @@ TEST(ObjectInfoDatasetTest, OnlyCompleteBytesAreCalledComplete) {
   const Data content = filled().content();
   constexpr std::size_t written = 74 + 1 + 2 * 13;
   for (std::size_t size = 0; size <= content.size(); ++size) {
-    EXPECT_EQ(MSObjectInfoDataset::isComplete(content.bytes().first(size)), size >= written)
-        << size;
+    EXPECT_EQ(MSObjectInfoDataset::isComplete(content.bytes().first(size)), size >= written) << size;
   }
 }
 

@@ -8,8 +8,7 @@ namespace brivo {
 namespace {
 
 TEST(ClocksTest, TheTimeOfDayEndsInTheNanosecondCountAndTwoBlanks) {
-  EXPECT_THAT(__OVLogDateString(),
-              testing::MatchesRegex("[0-2][0-9]:[0-5][0-9]:[0-6][0-9]: *[0-9]{3,9}  "));
+  EXPECT_THAT(__OVLogDateString(), testing::MatchesRegex("[0-2][0-9]:[0-5][0-9]:[0-6][0-9]: *[0-9]{3,9}  "));
 }
 
 TEST(ClocksTest, ATickIsANanosecond) {
@@ -18,8 +17,7 @@ TEST(ClocksTest, ATickIsANanosecond) {
 }
 
 TEST(ClocksTest, TheBenchmarkLineMarksMoreThan300Milliseconds) {
-  EXPECT_EQ(benchmarkLine("Total Enumeration Time", 12.4F),
-            "Total Enumeration Time   [   12 ms] {𝚫}");
+  EXPECT_EQ(benchmarkLine("Total Enumeration Time", 12.4F), "Total Enumeration Time   [   12 ms] {𝚫}");
   EXPECT_EQ(benchmarkLine("x", 300.0F), "x   [  300 ms] {𝚫}");
   EXPECT_EQ(benchmarkLine("x", 301.0F), "x   [  301 ms] {⊗}");
 }

@@ -23,8 +23,7 @@ TEST(LogTest, ATagOf20CharactersPrintsWholeAndOneOf21AsItsFirst18AndTwoDots) {
   const StandardErrorCapture capture;
   OVLog("abcdefghijklmnopqrst", "message");
   OVLog("abcdefghijklmnopqrstu", "message");
-  EXPECT_EQ(capture.text(),
-            "<5>abcdefghijklmnopqrst | message\n<5>abcdefghijklmnopqr.. | message\n");
+  EXPECT_EQ(capture.text(), "<5>abcdefghijklmnopqrst | message\n<5>abcdefghijklmnopqr.. | message\n");
 }
 
 TEST(LogTest, TagsAreRightAlignedAndErrorsMarkedWithAnExclamationMark) {

@@ -17,9 +17,7 @@ class PreferencesTest : public testing::Test {
   PreferencesTest() { OVLoggingLevel = 0; }
   ~PreferencesTest() override { OVLoggingLevel = 0; }
 
-  void store(const Dictionary& preferences) {
-    ASSERT_FALSE(store_.write(OVPreferencesDomain, preferences));
-  }
+  void store(const Dictionary& preferences) { ASSERT_FALSE(store_.write(OVPreferencesDomain, preferences)); }
   Dictionary stored() const { return store_.read(OVPreferencesDomain); }
 
   test::TemporaryFolder folder_;

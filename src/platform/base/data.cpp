@@ -15,8 +15,6 @@ Data Data::copyOf(std::span<const std::byte> bytes) {
 
 Data Data::copyOf(std::string_view text) { return copyOf(std::as_bytes(std::span(text))); }
 
-std::string_view Data::text() const {
-  return {reinterpret_cast<const char*>(bytes_.data()), bytes_.size()};
-}
+std::string_view Data::text() const { return {reinterpret_cast<const char*>(bytes_.data()), bytes_.size()}; }
 
 }  // namespace brivo

@@ -26,9 +26,7 @@ Mapping Mapping::sharedWritable(int fd, std::size_t size) {
   return map(size, PROT_READ | PROT_WRITE, MAP_SHARED, fd);
 }
 
-Mapping Mapping::sharedReadable(int fd, std::size_t size) {
-  return map(size, PROT_READ, MAP_SHARED, fd);
-}
+Mapping Mapping::sharedReadable(int fd, std::size_t size) { return map(size, PROT_READ, MAP_SHARED, fd); }
 
 Mapping Mapping::map(std::size_t size, int protection, int flags, int fd) {
   if (size == 0) return {};

@@ -37,8 +37,7 @@ class BRIVO_THREAD_ANNOTATION(capability("mutex")) Mutex {
 /// Holds a Mutex for its own lifetime. *Thread-bound.*
 class BRIVO_THREAD_ANNOTATION(scoped_lockable) MutexLock {
  public:
-  explicit MutexLock(Mutex& mutex) BRIVO_THREAD_ANNOTATION(acquire_capability(mutex))
-      : mutex_(mutex) {
+  explicit MutexLock(Mutex& mutex) BRIVO_THREAD_ANNOTATION(acquire_capability(mutex)) : mutex_(mutex) {
     mutex_.lock();
   }
   ~MutexLock() BRIVO_THREAD_ANNOTATION(release_capability()) { mutex_.unlock(); }

@@ -17,8 +17,6 @@ void UniqueFd::reset(int fd) {
   fd_ = fd;
 }
 
-UniqueFd UniqueFd::duplicate() const {
-  return UniqueFd(fd_ < 0 ? -1 : ::fcntl(fd_, F_DUPFD_CLOEXEC, 0));
-}
+UniqueFd UniqueFd::duplicate() const { return UniqueFd(fd_ < 0 ? -1 : ::fcntl(fd_, F_DUPFD_CLOEXEC, 0)); }
 
 }  // namespace brivo

@@ -9,8 +9,7 @@ namespace brivo {
 namespace {
 
 bool isPathCharacter(char c) {
-  const bool alphanumeric =
-      (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9');
+  const bool alphanumeric = (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9');
   return alphanumeric || std::string_view("-._~!$&'()*+,;=:@/").find(c) != std::string_view::npos;
 }
 

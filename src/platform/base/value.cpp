@@ -90,9 +90,7 @@ const T* member(const Dictionary& dictionary, std::string_view key) {
 
 }  // namespace
 
-const std::string* Dictionary::string(std::string_view key) const {
-  return member<std::string>(*this, key);
-}
+const std::string* Dictionary::string(std::string_view key) const { return member<std::string>(*this, key); }
 const Array* Dictionary::array(std::string_view key) const { return member<Array>(*this, key); }
 const Dictionary* Dictionary::dictionary(std::string_view key) const {
   return member<Dictionary>(*this, key);
@@ -145,9 +143,7 @@ struct Describe {
     return fmt::format("{}", value);
   }
   std::string operator()(const std::string& value) const { return value; }
-  std::string operator()(const Data& value) const {
-    return fmt::format("<{} bytes>", value.size());
-  }
+  std::string operator()(const Data& value) const { return fmt::format("<{} bytes>", value.size()); }
   std::string operator()(const Url& value) const { return value.text(); }
   std::string operator()(const Endpoint& value) const { return value.address; }
   std::string operator()(const IndexSet& value) const {

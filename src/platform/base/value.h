@@ -122,18 +122,7 @@ class Dictionary {
 class Value {
  public:
   /// The kinds that a receiver may restrict an argument to.
-  enum class Class {
-    none,
-    number,
-    string,
-    data,
-    url,
-    endpoint,
-    indexSet,
-    error,
-    array,
-    dictionary
-  };
+  enum class Class { none, number, string, data, url, endpoint, indexSet, error, array, dictionary };
 
   Value() = default;
   Value(bool value) : storage_(value) {}
@@ -177,8 +166,8 @@ class Value {
   friend bool operator==(const Value&, const Value&) = default;
 
  private:
-  std::variant<std::monostate, bool, std::int32_t, std::uint32_t, std::int64_t, std::uint64_t,
-               double, std::string, Data, Url, Endpoint, IndexSet, Error, Array, Dictionary>
+  std::variant<std::monostate, bool, std::int32_t, std::uint32_t, std::int64_t, std::uint64_t, double,
+               std::string, Data, Url, Endpoint, IndexSet, Error, Array, Dictionary>
       storage_;
 };
 

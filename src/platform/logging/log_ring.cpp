@@ -53,8 +53,7 @@ void LogRing::writeLines() {
     mutex_.unlock();
     line.log->writeNow(line.level, line.text);
     if (dropped > 0) {
-      line.log->writeNow(LogLevel::error,
-                         fmt::format("{:>20} ! {} log lines dropped", "log", dropped));
+      line.log->writeNow(LogLevel::error, fmt::format("{:>20} ! {} log lines dropped", "log", dropped));
     }
     mutex_.lock();
   }

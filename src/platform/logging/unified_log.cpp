@@ -78,9 +78,8 @@ void UnifiedLog::writeNow(LogLevel level, std::string_view line) const {
 }
 
 void UnifiedLog::writeToJournal(int priority, std::string_view line) const {
-  std::array<std::string, 4> fields{
-      fmt::format("MESSAGE={}", line), fmt::format("PRIORITY={}", priority),
-      "SYSLOG_IDENTIFIER=" + category_, "ORVID_SUBSYSTEM=" + subsystem_};
+  std::array<std::string, 4> fields{fmt::format("MESSAGE={}", line), fmt::format("PRIORITY={}", priority),
+                                    "SYSLOG_IDENTIFIER=" + category_, "ORVID_SUBSYSTEM=" + subsystem_};
   std::array<iovec, 4> vectors{};
   for (std::size_t i = 0; i < fields.size(); ++i) vectors[i] = {fields[i].data(), fields[i].size()};
   ::sd_journal_sendv(vectors.data(), static_cast<int>(vectors.size()));

@@ -103,8 +103,8 @@ struct Append {
 };
 
 constexpr bool representable(Value::Class kind) {
-  return kind != Value::Class::none && kind != Value::Class::endpoint &&
-         kind != Value::Class::indexSet && kind != Value::Class::error;
+  return kind != Value::Class::none && kind != Value::Class::endpoint && kind != Value::Class::indexSet &&
+         kind != Value::Class::error;
 }
 
 void append(pugi::xml_node parent, const Value& value) {

@@ -46,8 +46,7 @@ std::string folderOr(const char* name, const std::string& fallback) {
 }
 
 std::string runtimeFolder() {
-  if (const auto own = variable("BRIVOD_RUNTIME_DIR"); own.starts_with('/'))
-    return std::string(own);
+  if (const auto own = variable("BRIVOD_RUNTIME_DIR"); own.starts_with('/')) return std::string(own);
   const auto xdg = variable("XDG_RUNTIME_DIR");
   if (xdg.starts_with('/')) return appendingPathComponent(xdg, "brivod");
   return ::getuid() == 0 ? "/run/brivod" : "";

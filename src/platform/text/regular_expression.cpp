@@ -40,8 +40,7 @@ RegularExpression::RegularExpression(std::string_view pattern) {
   pcre2_set_newline(context.get(), PCRE2_NEWLINE_ANY);
   int error = 0;
   PCRE2_SIZE offset = 0;
-  pcre2_code* code =
-      pcre2_compile(units(pattern), pattern.size(), options, &error, &offset, context.get());
+  pcre2_code* code = pcre2_compile(units(pattern), pattern.size(), options, &error, &offset, context.get());
   if (!code) {
     fmt::print(stderr, "expression {} does not compile at {}: error {}\n", pattern, offset, error);
     std::abort();
@@ -54,8 +53,8 @@ RegularExpression::~RegularExpression() = default;
 
 bool RegularExpression::matches(std::string_view text) const {
   thread_local const MatchData match;
-  return match.data && pcre2_match(code_->code, units(text), text.size(), 0, PCRE2_NO_UTF_CHECK,
-                                   match.data, nullptr) >= 0;
+  return match.data &&
+         pcre2_match(code_->code, units(text), text.size(), 0, PCRE2_NO_UTF_CHECK, match.data, nullptr) >= 0;
 }
 
 }  // namespace brivo

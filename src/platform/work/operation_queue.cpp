@@ -7,8 +7,7 @@
 
 namespace brivo {
 
-OperationQueue::OperationQueue(std::string name)
-    : name_(std::move(name)), thread_([this] { work(); }) {}
+OperationQueue::OperationQueue(std::string name) : name_(std::move(name)), thread_([this] { work(); }) {}
 
 OperationQueue::~OperationQueue() {
   cancelAllOperations();

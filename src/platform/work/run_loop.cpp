@@ -100,8 +100,7 @@ void RunLoop::onSignals(std::initializer_list<int> signals, const Task& task) {
       static_cast<Watch*>(userdata)->task();
       return 0;
     };
-    check(sd_event_add_signal(event_, &watch->source, signal, onSignal, watch.get()),
-          "sd_event_add_signal");
+    check(sd_event_add_signal(event_, &watch->source, signal, onSignal, watch.get()), "sd_event_add_signal");
     watches_.emplace(watch.get(), std::move(watch));
   }
 }

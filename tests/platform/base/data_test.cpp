@@ -52,8 +52,7 @@ TEST(MemoryFileTest, TheSealsForbidShrinkingGrowingAndNewWritableMappings) {
   ASSERT_TRUE(data);
   EXPECT_NE(::ftruncate(data->memfd(), 10), 0);
   EXPECT_NE(::ftruncate(data->memfd(), 8192), 0);
-  EXPECT_EQ(::mmap(nullptr, 4096, PROT_READ | PROT_WRITE, MAP_SHARED, data->memfd(), 0),
-            MAP_FAILED);
+  EXPECT_EQ(::mmap(nullptr, 4096, PROT_READ | PROT_WRITE, MAP_SHARED, data->memfd(), 0), MAP_FAILED);
   EXPECT_NE(::pwrite(data->memfd(), "y", 1, 0), 1);
 }
 

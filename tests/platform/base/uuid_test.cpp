@@ -10,9 +10,8 @@ namespace brivo {
 namespace {
 
 TEST(UuidTest, IsCanonicalUpperCaseVersion4) {
-  EXPECT_THAT(
-      randomUuidString(),
-      testing::MatchesRegex("[0-9A-F]{8}-[0-9A-F]{4}-4[0-9A-F]{3}-[89AB][0-9A-F]{3}-[0-9A-F]{12}"));
+  EXPECT_THAT(randomUuidString(),
+              testing::MatchesRegex("[0-9A-F]{8}-[0-9A-F]{4}-4[0-9A-F]{3}-[89AB][0-9A-F]{3}-[0-9A-F]{12}"));
 }
 
 TEST(UuidTest, EveryOneIsNew) {

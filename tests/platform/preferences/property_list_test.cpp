@@ -9,17 +9,16 @@ namespace brivo {
 namespace {
 
 std::string list(const std::string& inside) {
-  return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<plist version=\"1.0\">" + inside +
-         "</plist>";
+  return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<plist version=\"1.0\">" + inside + "</plist>";
 }
 
 TEST(PropertyListTest, ReadsEveryElement) {
-  const auto dictionary = parsePropertyList(
-      list("<dict><key>s</key><string>a &amp; b</string><key>i</key><integer>-7</integer>"
-           "<key>u</key><integer>18446744073709551615</integer><key>r</key><real>1.5</real>"
-           "<key>t</key><true/><key>f</key><false/><key>d</key><data>\n  AQID\n</data>"
-           "<key>when</key><date>2024-01-02T03:04:05Z</date>"
-           "<key>a</key><array><string>x</string><dict/></array></dict>"));
+  const auto dictionary =
+      parsePropertyList(list("<dict><key>s</key><string>a &amp; b</string><key>i</key><integer>-7</integer>"
+                             "<key>u</key><integer>18446744073709551615</integer><key>r</key><real>1.5</real>"
+                             "<key>t</key><true/><key>f</key><false/><key>d</key><data>\n  AQID\n</data>"
+                             "<key>when</key><date>2024-01-02T03:04:05Z</date>"
+                             "<key>a</key><array><string>x</string><dict/></array></dict>"));
   ASSERT_TRUE(dictionary);
   EXPECT_EQ(*dictionary->string("s"), "a & b");
   EXPECT_EQ(dictionary->signedInteger("i"), -7);
@@ -60,12 +59,10 @@ TEST(PropertyListTest, ValuesWithoutAnElementAreLeftOutWithTheirKeys) {
 
 TEST(PropertyListTest, RefusesWhatIsNoPropertyList) {
   for (const std::string& bad :
-       {std::string(""), std::string("bplist00"), std::string("<plist>"), list(""),
-        list("<array/>"), list("<dict><key>k</key></dict>"),
-        list("<dict><string>v</string></dict>"), list("<dict><key>k</key><wrong/></dict>"),
-        list("<dict><key>k</key><integer>x</integer></dict>"),
-        list("<dict><key>k</key><integer/></dict>"),
-        list("<dict><key>k</key><data>!</data></dict>")}) {
+       {std::string(""), std::string("bplist00"), std::string("<plist>"), list(""), list("<array/>"),
+        list("<dict><key>k</key></dict>"), list("<dict><string>v</string></dict>"),
+        list("<dict><key>k</key><wrong/></dict>"), list("<dict><key>k</key><integer>x</integer></dict>"),
+        list("<dict><key>k</key><integer/></dict>"), list("<dict><key>k</key><data>!</data></dict>")}) {
     EXPECT_FALSE(parsePropertyList(bad)) << bad;
   }
 }

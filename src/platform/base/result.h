@@ -30,10 +30,10 @@ class [[nodiscard]] Result {
 
   T& value() & { return std::get<0>(storage_); }
   const T& value() const& { return std::get<0>(storage_); }
-  T&& value() && { return std::get<0>(std::move(storage_)); }
+  T value() && { return std::get<0>(std::move(storage_)); }
   T& operator*() & { return value(); }
   const T& operator*() const& { return value(); }
-  T&& operator*() && { return std::move(*this).value(); }
+  T operator*() && { return std::move(*this).value(); }
   T* operator->() { return &value(); }
   const T* operator->() const { return &value(); }
 

@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: MIT
+#include <gtest/gtest.h>
+
+#include <thread>
+
+#include "platform/keepalive/idle_exit.h"
+#include "platform/keepalive/transactions.h"
+
+namespace brivo {
+namespace {
+
+using namespace std::chrono_literals;
+
+TEST(TransactionsTest, CountsWhatIsUnderWayAndTellsWhenNothingIs) {
+  Transactions transactions;
+  int told = 0;
+  transactions.onNone([&] { ++told; });
+  auto first = transactions.begin("00001");
+  {
+    const auto second = transactions.begin("00002");
+    EXPECT_EQ(transactions.count(), 2u);
+  }
+  EXPECT_EQ(told, 0);
+  first.reset();
+  EXPECT_EQ(transactions.count(), 0u);
+  EXPECT_EQ(told, 1);
+}
+
+TEST(TransactionsTest, ATransactionMayOutliveTheCount) {
+  Transactions::Transaction held;
+  {
+    Transactions transactions;
+    held = transactions.begin("x");
+  }
+  held.reset();
+}
+
+TEST(IdleExitTest, TheLoopEndsAfterTheIdleTime) {
+  RunLoop loop;
+  Transactions transactions;
+  int checks = 0;
+  const IdleExit exit(loop, transactions, 0s, [&](const auto& answer) {
+    ++checks;
+    answer(true);
+  });
+  loop.run();
+  EXPECT_EQ(checks, 1);
+}
+
+TEST(IdleExitTest, ATransactionKeepsItAndTheLastCheckMayRefuse) {
+  RunLoop loop;
+  Transactions transactions;
+  auto transaction = transactions.begin("x");
+  int checks = 0;
+  const IdleExit exit(loop, transactions, 0s, [&](const auto& answer) { answer(++checks == 2); });
+  loop.postAfter(30ms, [&] {
+    EXPECT_EQ(checks, 0);
+    transaction.reset();
+  });
+  loop.run();
+  EXPECT_EQ(checks, 2);
+}
+
+}  // namespace
+}  // namespace brivo

@@ -1,0 +1,48 @@
+// SPDX-License-Identifier: MIT
+// What items need of the device that they belong to.
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+
+#include "platform/base/value.h"
+#include "platform/files/file_system.h"
+#include "platform/work/task.h"
+
+namespace brivo {
+
+class BrivoFile;
+class BrivoFolder;
+
+/// Owned by the device's side; items know it by this alone, and do not own it. *Thread-safe.*
+class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
+ public:
+  virtual ~CameraDevice() = default;
+
+  /// The volume's name; empty until a client has started using the device.
+  virtual std::string name() const = 0;
+  /// The volume is mounted read-only.
+  virtual bool isLocked() const = 0;
+  /// A client asked for fast enumeration: what may come later should.
+  virtual bool prioritizeSpeed() const = 0;
+  virtual bool beingEjected() const = 0;
+  virtual FileSystem& files() const = 0;
+
+  virtual void addCameraFileToIndex(std::shared_ptr<BrivoFile> file) = 0;
+  virtual void addCameraFolderToIndex(std::shared_ptr<BrivoFolder> folder) = 0;
+  /// Downloadable objects announced to clients.
+  virtual std::int32_t msObjectCount() const = 0;
+  virtual std::uint32_t contentCatalogPercentCompleted() const = 0;
+  /// Sends a content batch to all clients.
+  virtual void sendAddedItems(Dictionary batch) = 0;
+
+  /// Queues an operation behind the requests of clients.
+  virtual void addInitiatedOperation(Task operation) = 0;
+  /// Runs a step of an enumeration on the device's share of the pool.
+  virtual void enumerateConcurrently(Task step) = 0;
+  /// The same, but not before a client has room for what the step will send.
+  virtual void enumerateWhenClientsKeepUp(Task step) = 0;
+};
+
+}  // namespace brivo

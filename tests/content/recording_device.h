@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: MIT
+// A device that keeps what items tell it, for tests of items on real files.
+#pragma once
+
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "content/brivo_folder.h"
+#include "content/camera_device.h"
+#include "content/media/brivo_file.h"
+#include "platform/work/pool.h"
+#include "protocol/keys.h"
+#include "ptp/object_info_dataset.h"
+
+namespace brivo {
+
+class RecordingDevice : public CameraDevice {
+ public:
+  std::string name() const override { return "CARD"; }
+  bool isLocked() const override { return locked; }
+  bool prioritizeSpeed() const override { return false; }
+  bool beingEjected() const override { return ejected; }
+  FileSystem& files() const override { return *fileSystem; }
+
+  void addCameraFileToIndex(std::shared_ptr<BrivoFile> file) override {
+    const std::lock_guard lock(mutex);
+    files_.push_back(std::move(file));
+  }
+  void addCameraFolderToIndex(std::shared_ptr<BrivoFolder> folder) override {
+    const std::lock_guard lock(mutex);
+    folders.push_back(std::move(folder));
+  }
+  std::int32_t msObjectCount() const override { return 7; }
+  std::uint32_t contentCatalogPercentCompleted() const override { return 42; }
+  void sendAddedItems(Dictionary batch) override {
+    const std::lock_guard lock(mutex);
+    batches.push_back(std::move(batch));
+  }
+  void addInitiatedOperation(Task operation) override { operation(); }
+  /// Steps run in order on the test's thread, in run().
+  void enumerateConcurrently(Task step) override { steps.push_back(std::move(step)); }
+  void enumerateWhenClientsKeepUp(Task step) override { steps.push_back(std::move(step)); }
+
+  /// Runs steps until there are none left.
+  void run() {
+    while (!steps.empty()) {
+      const Task step = std::move(steps.front());
+      steps.erase(steps.begin());
+      step();
+    }
+  }
+
+  /// The names in each batch, in the order of sending.
+  std::vector<std::vector<std::string>> batchNames() {
+    std::vector<std::vector<std::string>> names;
+    for (const Dictionary& batch : batches) {
+      names.emplace_back();
+      for (const Value& dataset : *batch.array(keys::kObjectInfoArray)) {
+        names.back().push_back(MSObjectInfoDataset(*dataset.get<Data>()).filename());
+      }
+    }
+    return names;
+  }
+
+  bool locked = false;
+  bool ejected = false;
+  FileSystem* fileSystem = &systemFiles();
+  std::mutex mutex;
+  std::vector<std::shared_ptr<BrivoFile>> files_;
+  std::vector<std::shared_ptr<BrivoFolder>> folders;
+  std::vector<Dictionary> batches;
+  std::vector<Task> steps;
+};
+
+}  // namespace brivo

@@ -1,0 +1,159 @@
+// SPDX-License-Identifier: MIT
+#include "access/access_database.h"
+
+#include <charconv>
+#include <ctime>
+
+#include "platform/base/paths.h"
+#include "platform/settings/folders.h"
+#include "util/log.h"
+
+namespace brivo {
+
+namespace {
+
+constexpr const char* kTag = "ovaccess";
+constexpr const char* kControlListTag = "ovcontrol";
+
+const char* nameOf(AccessDatabase::Table table) {
+  return table == AccessDatabase::Table::control ? "camera_control" : "orvid_apps";
+}
+
+std::int64_t now() { return static_cast<std::int64_t>(std::time(nullptr)); }
+
+std::int64_t flag(bool value) { return value ? 1 : 0; }
+
+}  // namespace
+
+AccessDatabase::AccessDatabase(Pool& pool, const std::string& folder)
+    : deviceAccessQueue_(SerialQueue::create(pool)) {
+  deviceAccessQueue_->runAndWait([&] { open(folder); });
+}
+
+AccessDatabase::~AccessDatabase() {
+  deviceAccessQueue_->runAndWait([&] {
+    if (database_ && database_->close()) OVLogError(kTag, "Failed to close database");
+  });
+}
+
+void AccessDatabase::open(const std::string& folder) {
+  if (const auto error = makePrivateFolder(folder)) OVLogError(kTag, "{}", error->text());
+  auto opened = Database::open(appendingPathComponent(folder, "externalMediaAccess.db"));
+  if (!opened.ok()) {
+    OVLogError(kTag, "Failed to open/create database");
+    OVLogError(kTag, "{}", opened.error().text());
+    return;
+  }
+  database_ = *std::move(opened);
+  createTables();
+}
+
+void AccessDatabase::createTables() {
+  for (const char* table : {"orvid_apps", "camera_control"}) {
+    const auto failure = database_->execute(std::string("CREATE TABLE IF NOT EXISTS ") + table +
+                                            " (ID INTEGER PRIMARY KEY AUTOINCREMENT, bundle_id TEXT,"
+                                            " date_added INTEGER, whitelisted INTEGER)");
+    if (failure) OVLogError(kTag, "Failed to create table: {} - {}", table, *failure);
+  }
+  if (database_->hasColumn("camera_control", "whitelisted")) return;
+  OVLogError(kTag, "'whitelisted' does not appear in camera_control, updating database");
+  if (const auto failure = database_->execute("ALTER TABLE camera_control add whitelisted INTEGER")) {
+    OVLogError(kTag, "Failed to create column: camera_control|whitelisted - {}", *failure);
+  }
+}
+
+void AccessDatabase::execute(const char* tag, const std::string& statement,
+                             std::initializer_list<Database::Binding> bindings,
+                             const Database::RowHandler& onRow) {
+  deviceAccessQueue_->runAndWait([&] {
+    if (!database_) return OVLogError(tag, "no database");
+    if (const auto failure = database_->execute(statement, bindings, onRow)) OVLogError(tag, "{}", *failure);
+  });
+}
+
+std::vector<std::string> AccessDatabase::list(const char* tag, const std::string& statement) {
+  std::vector<std::string> identifiers;
+  execute(tag, statement, {}, [&](const Database::Row& row) {
+    for (std::string& value : OVAcessQueryCompletion(row)) identifiers.push_back(std::move(value));
+  });
+  return identifiers;
+}
+
+std::vector<std::string> AccessDatabase::bundleIdentifiersAccessingExternalCameras() {
+  return list(kTag, "SELECT bundle_id FROM orvid_apps;");
+}
+
+std::vector<Dictionary> AccessDatabase::bundleIdentifiersAccessingExternalCamerasWithStatus() {
+  std::vector<Dictionary> rows;
+  execute(kTag, "SELECT bundle_id, whitelisted FROM orvid_apps;", {},
+          [&](const Database::Row& row) { rows.push_back(OVAcessStatusQueryCompletion(row)); });
+  return rows;
+}
+
+void AccessDatabase::addApplicationWithBundleIdentifier(const std::string& bundleIdentifier, bool whitelist) {
+  execute(kTag, "INSERT INTO orvid_apps(bundle_id,date_added,whitelisted) VALUES (?,?,?);",
+          {bundleIdentifier, now(), flag(whitelist)});
+}
+
+void AccessDatabase::updateApplicationWithBundleIdentifier(const std::string& bundleIdentifier, bool status) {
+  execute(kTag, "UPDATE orvid_apps SET whitelisted = ? WHERE bundle_id = ?;",
+          {flag(status), bundleIdentifier});
+}
+
+void AccessDatabase::revokeApplicationWithBundleIdentifier(const std::string& bundleIdentifier) {
+  OVLogError(kTag, "Revoking Application BundleID {}", bundleIdentifier);
+  execute(kTag, "DELETE FROM orvid_apps WHERE bundle_id IS ?;", {bundleIdentifier});
+}
+
+std::vector<std::string> AccessDatabase::bundleIdentifiersControllingExternalCameras() {
+  return list(kControlListTag, "SELECT bundle_id FROM camera_control;");
+}
+
+void AccessDatabase::addControlApplicationWithBundleIdentifier(const std::string& bundleIdentifier,
+                                                               bool whitelisted) {
+  execute(kTag, "INSERT INTO camera_control(bundle_id,date_added,whitelisted) VALUES (?,?,?);",
+          {bundleIdentifier, now(), flag(whitelisted)});
+}
+
+void AccessDatabase::revokeControlApplicationWithBundleIdentifier(const std::string& bundleIdentifier) {
+  OVLogError(kTag, "Revoking Control BundleID {}", bundleIdentifier);
+  execute(kTag, "DELETE FROM camera_control WHERE bundle_id IS ?;", {bundleIdentifier});
+}
+
+std::vector<Dictionary> AccessDatabase::rowsOf(const std::string& bundleIdentifier, Table table) {
+  std::vector<Dictionary> rows;
+  execute(kTag,
+          std::string("SELECT bundle_id, date_added, whitelisted FROM ") + nameOf(table) +
+              " WHERE bundle_id IS ?;",
+          {bundleIdentifier},
+          [&](const Database::Row& row) { rows.push_back(OVAcessStatusQueryCompletion(row)); });
+  return rows;
+}
+
+std::vector<std::string> OVAcessQueryCompletion(const Database::Row& row) {
+  std::vector<std::string> values;
+  for (const auto& [column, value] : row) {
+    if (!value) continue;
+    OVLog("adding", "{}", *value);
+    values.push_back(*value);
+  }
+  return values;
+}
+
+Dictionary OVAcessStatusQueryCompletion(const Database::Row& row) {
+  Dictionary dictionary;
+  for (std::size_t i = 0; i < row.size() && i < 3; ++i) {
+    const auto& [column, value] = row[i];
+    if (!value) continue;
+    if (i == 0) {
+      dictionary.set(column, *value);
+    } else {
+      std::int64_t number = 0;
+      std::from_chars(value->data(), value->data() + value->size(), number);
+      dictionary.set(column, number);
+    }
+  }
+  return dictionary;
+}
+
+}  // namespace brivo

@@ -4,7 +4,6 @@
 #include "content/folder_walk.h"
 #include "content/media/brivo_file.h"
 #include "platform/base/paths.h"
-#include "protocol/keys.h"
 #include "protocol/result_codes.h"
 #include "util/log.h"
 
@@ -36,19 +35,14 @@ std::shared_ptr<BrivoFile> BrivoFolder::newItemWithFSURL(std::string path, std::
   if (!file) return nullptr;
   OVLogVerbose(kLogTypeDetail, file->name(), "File queued: {}\n", file->path());
   device().addCameraFileToIndex(file);
-  if (notify) {
-    Array own(Array::Kind::data);
-    own.append(info().content());
-    flushNotifications(std::move(own));
-  }
+  if (notify) announce();
   return file;
 }
 
-void BrivoFolder::flushNotifications(Array datasets) const {
-  device().sendAddedItems(
-      {{std::string(keys::kObjectInfoArray), std::move(datasets)},
-       {std::string(keys::kNumberOfDownloadableObjects), device().msObjectCount()},
-       {std::string(keys::kContentCatalogPercentCompleted), device().contentCatalogPercentCompleted()}});
+void BrivoFolder::announce() const {
+  Array own(Array::Kind::data);
+  own.append(info().content());
+  flushNotifications(std::move(own));
 }
 
 std::shared_ptr<BrivoFolder> BrivoFolder::folderMatchingPath(std::string_view path) {

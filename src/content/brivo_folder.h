@@ -5,6 +5,8 @@
 
 namespace brivo {
 
+class BrivoFile;
+
 /// A directory on a volume.
 class BrivoFolder final : public BrivoItem, public std::enable_shared_from_this<BrivoFolder> {
  public:
@@ -25,7 +27,9 @@ class BrivoFolder final : public BrivoItem, public std::enable_shared_from_this<
                                               const ResourceValues* prefetched = nullptr);
 
   /// Sends serialised datasets to all clients as one content batch.
-  void flushNotifications(Array datasets) const;
+  void flushNotifications(Array datasets) const { device().flushNotifications(std::move(datasets)); }
+  /// Sends this folder's own dataset in a batch of its own.
+  void announce() const;
 
   /// This folder when the last component of `path` is its name, else null.
   std::shared_ptr<BrivoFolder> folderMatchingPath(std::string_view path);

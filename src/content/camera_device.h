@@ -12,8 +12,7 @@
 
 namespace brivo {
 
-class BrivoFile;
-class BrivoFolder;
+class BrivoItem;
 
 /// Owned by the device's side; items know it by this alone, and do not own it. *Thread-safe.*
 class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
@@ -29,13 +28,10 @@ class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
   virtual bool beingEjected() const = 0;
   virtual FileSystem& files() const = 0;
 
-  virtual void addCameraFileToIndex(std::shared_ptr<BrivoFile> file) = 0;
-  virtual void addCameraFolderToIndex(std::shared_ptr<BrivoFolder> folder) = 0;
-  /// Downloadable objects announced to clients.
-  virtual std::int32_t msObjectCount() const = 0;
-  virtual std::uint32_t contentCatalogPercentCompleted() const = 0;
-  /// Sends a content batch to all clients.
-  virtual void sendAddedItems(Dictionary batch) = 0;
+  virtual void addCameraFileToIndex(const std::shared_ptr<BrivoItem>& item) = 0;
+  virtual void addCameraFolderToIndex(const std::shared_ptr<BrivoItem>& item) = 0;
+  /// Sends serialised datasets to all clients as one content batch.
+  virtual void flushNotifications(Array datasets) = 0;
 
   /// Queues an operation behind the requests of clients.
   virtual void addInitiatedOperation(Task operation) = 0;

@@ -23,12 +23,6 @@ constexpr std::int64_t kOldestFirst = -1;
 constexpr std::size_t kLongestDumpedName = 18;
 constexpr std::size_t kKeptOfDumpedName = 17;
 
-Array batchOf(const BrivoItem& item) {
-  Array batch(Array::Kind::data);
-  batch.append(item.info().content());
-  return batch;
-}
-
 }  // namespace
 
 void sortEntries(std::vector<DirectoryEntry>& entries, std::int64_t chronologicalOrder) {
@@ -111,7 +105,7 @@ void FolderWalk::enumerateMediaRootEntry(const DirectoryEntry& entry) {
                                                     entry.name, folder_.get(), device, &entry.values);
   if (!subFolder) return;
   device.addCameraFolderToIndex(subFolder);
-  folder_->flushNotifications(batchOf(*subFolder));
+  subFolder->announce();
   subFolder->enumerateContentWithOptions(options_);
 }
 

@@ -9,6 +9,7 @@
 
 #include "content/grouping.h"
 #include "content/recording_device.h"
+#include "protocol/keys.h"
 #include "support/standard_error.h"
 #include "support/temporary_folder.h"
 #include "util/log.h"
@@ -102,17 +103,6 @@ TEST_F(FolderWalkTest, TheFilesOfOneShotTravelTogether) {
   walk("100ABCDE", "100ABCDE");
   EXPECT_THAT(device->batchNames(),
               ElementsAre(ElementsAre("IMG_0001.JPG", "IMG_0001.CR2"), ElementsAre("IMG_0002.JPG")));
-}
-
-TEST_F(FolderWalkTest, ABatchCarriesTheCountAndThePercentage) {
-  add("100ABCDE/IMG_0001.JPG");
-  walk("100ABCDE", "100ABCDE");
-  ASSERT_EQ(device->batches.size(), 1u);
-  const Dictionary& batch = device->batches[0];
-  EXPECT_EQ(batch.size(), 3u);
-  ASSERT_TRUE(batch.find(keys::kNumberOfDownloadableObjects));
-  EXPECT_EQ(*batch.find(keys::kNumberOfDownloadableObjects)->get<std::int32_t>(), 7);
-  EXPECT_EQ(*batch.find(keys::kContentCatalogPercentCompleted)->get<std::uint32_t>(), 42u);
 }
 
 TEST_F(FolderWalkTest, AFolderOfDumpedEntriesSendsNoBatchAndLogsTheCountInFiveDigits) {

@@ -10,7 +10,6 @@
 #include "content/camera_device.h"
 #include "content/media/brivo_file.h"
 #include "platform/work/pool.h"
-#include "protocol/keys.h"
 #include "ptp/object_info_dataset.h"
 
 namespace brivo {
@@ -23,19 +22,17 @@ class RecordingDevice : public CameraDevice {
   bool beingEjected() const override { return ejected; }
   FileSystem& files() const override { return *fileSystem; }
 
-  void addCameraFileToIndex(std::shared_ptr<BrivoFile> file) override {
+  void addCameraFileToIndex(const std::shared_ptr<BrivoItem>& item) override {
     const std::lock_guard lock(mutex);
-    files_.push_back(std::move(file));
+    files_.push_back(std::static_pointer_cast<BrivoFile>(item));
   }
-  void addCameraFolderToIndex(std::shared_ptr<BrivoFolder> folder) override {
+  void addCameraFolderToIndex(const std::shared_ptr<BrivoItem>& item) override {
     const std::lock_guard lock(mutex);
-    folders.push_back(std::move(folder));
+    folders.push_back(std::static_pointer_cast<BrivoFolder>(item));
   }
-  std::int32_t msObjectCount() const override { return 7; }
-  std::uint32_t contentCatalogPercentCompleted() const override { return 42; }
-  void sendAddedItems(Dictionary batch) override {
+  void flushNotifications(Array datasets) override {
     const std::lock_guard lock(mutex);
-    batches.push_back(std::move(batch));
+    batches.push_back(std::move(datasets));
   }
   void addInitiatedOperation(Task operation) override { operation(); }
   /// Steps run in order on the test's thread, in run().
@@ -54,9 +51,9 @@ class RecordingDevice : public CameraDevice {
   /// The names in each batch, in the order of sending.
   std::vector<std::vector<std::string>> batchNames() {
     std::vector<std::vector<std::string>> names;
-    for (const Dictionary& batch : batches) {
+    for (const Array& batch : batches) {
       names.emplace_back();
-      for (const Value& dataset : *batch.array(keys::kObjectInfoArray)) {
+      for (const Value& dataset : batch) {
         names.back().push_back(MSObjectInfoDataset(*dataset.get<Data>()).filename());
       }
     }
@@ -69,7 +66,7 @@ class RecordingDevice : public CameraDevice {
   std::mutex mutex;
   std::vector<std::shared_ptr<BrivoFile>> files_;
   std::vector<std::shared_ptr<BrivoFolder>> folders;
-  std::vector<Dictionary> batches;
+  std::vector<Array> batches;
   std::vector<Task> steps;
 };
 

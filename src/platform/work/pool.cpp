@@ -29,7 +29,7 @@ Pool::~Pool() {
   supervisor_.notify_all();
   supervisorThread_.join();
   mutex_.lock();
-  while (threads_ > 0) departures_.wait(mutex_);
+  while (threads_ > 0) quieter_.wait(mutex_);
   mutex_.unlock();
 }
 
@@ -44,6 +44,12 @@ void Pool::post(Task task) {
   }
   if (wakeWorker) workers_.notify_one();
   if (wakeSupervisor) supervisor_.notify_one();
+}
+
+void Pool::waitUntilIdle() {
+  mutex_.lock();
+  while (!queue_.empty() || idle_ < threads_) quieter_.wait(mutex_);
+  mutex_.unlock();
 }
 
 std::size_t Pool::threadCount() const {
@@ -74,12 +80,13 @@ void Pool::work() {
     }
   }
   --threads_;
-  departures_.notify_all();
+  quieter_.notify_all();
   mutex_.unlock();
 }
 
 bool Pool::waitForTask() {
   ++idle_;
+  quieter_.notify_all();
   bool stay = true;
   if (threads_ <= baseThreads_) {
     workers_.wait(mutex_);

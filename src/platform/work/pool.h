@@ -35,6 +35,9 @@ class Pool {
   /// Never blocks on running tasks. The task is destroyed on the thread that ran it.
   void post(Task task) BRIVO_EXCLUDES(mutex_);
 
+  /// Returns at a moment at which no task runs and none waits. Must not be called from a task.
+  void waitUntilIdle() BRIVO_EXCLUDES(mutex_);
+
   /// Threads that exist right now, the stuck ones among them.
   std::size_t threadCount() const BRIVO_EXCLUDES(mutex_);
 
@@ -51,7 +54,7 @@ class Pool {
   mutable Mutex mutex_;
   std::condition_variable_any workers_;
   std::condition_variable_any supervisor_;
-  std::condition_variable_any departures_;
+  std::condition_variable_any quieter_;  // a thread has become idle or has ended
   std::deque<Task> queue_ BRIVO_GUARDED_BY(mutex_);
   std::size_t threads_ BRIVO_GUARDED_BY(mutex_) = 0;
   std::size_t idle_ BRIVO_GUARDED_BY(mutex_) = 0;

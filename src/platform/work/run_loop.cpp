@@ -49,7 +49,12 @@ RunLoop::~RunLoop() {
   sd_event_unref(event_);
 }
 
-void RunLoop::run() { sd_event_loop(event_); }
+void RunLoop::run() {
+  sd_event_loop(event_);
+  std::deque<Task> dropped;
+  const MutexLock lock(mutex_);
+  dropped.swap(posted_);
+}
 
 void RunLoop::quit() {
   post([this] { sd_event_exit(event_, 0); });

@@ -26,7 +26,8 @@ class RunLoop {
   RunLoop(const RunLoop&) = delete;
   RunLoop& operator=(const RunLoop&) = delete;
 
-  /// Serves events until quit(). The calling thread is the loop's thread from then on.
+  /// Serves events until quit(), and drops what was posted and has not run by then. The calling thread is the
+  /// loop's thread from then on.
   void run();
   /// Makes run() return after the current task. *Thread-safe.*
   void quit();

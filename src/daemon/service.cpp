@@ -1,0 +1,88 @@
+// SPDX-License-Identifier: MIT
+#include "daemon/service.h"
+
+#include "platform/base/paths.h"
+#include "platform/preferences/preferences_store.h"
+#include "platform/settings/folders.h"
+#include "util/log.h"
+
+namespace brivo {
+
+namespace {
+
+constexpr std::chrono::seconds kDefaultIdleTime{60};
+constexpr const char* kDataFolder = "org.orvid.imagecapture";
+constexpr const char* kMatchingList = "OrvidCore/DeviceMatchingInfo.plist";
+
+/// The folder of the access database. The user's data folder above it is made when it is missing.
+std::string dataFolder(const Settings& settings) {
+  if (const auto error = makeBaseDirectory(settings.dataHome)) OVLogError("ovaccess", "{}", error->text());
+  return appendingPathComponent(settings.dataHome, kDataFolder);
+}
+
+}  // namespace
+
+Service::Service(RunLoop& mainLoop, Settings settings, std::unique_ptr<zeph::RuntimeFolder> folder)
+    : mainLoop_(mainLoop),
+      settings_(std::move(settings)),
+      folder_(std::move(folder)),
+      applications_(settings_.dataHome, settings_.dataDirs, std::string(kVendorPrefix)),
+      power_(mainLoop_, [](const std::string& line) { OVLogError("power", "{}", line); }),
+      database_(pool_, dataFolder(settings_)),
+      connections_(pool_, [](const std::string& line) { OVLogError("zeph", "{}", line); }),
+      volumes_(pool_, settings_.volumeRoots, settings_.volumeFolders),
+      manager_(std::make_shared<MSRemoteCameraDeviceManager>(mainLoop_, volumes_, transactions_,
+                                                             deviceServices())) {}
+
+Result<std::unique_ptr<Service>> Service::start(RunLoop& mainLoop) {
+  OVLog("brivo[zeph]", "{}", "Launching brivo [zeph]");
+  Settings settings = Settings::fromEnvironment();
+  auto folder = zeph::RuntimeFolder::claim(settings.runtimeDir);
+  if (!folder.ok()) return folder.error();
+  std::unique_ptr<Service> service(new Service(mainLoop, std::move(settings), *std::move(folder)));
+  service->manager_->startMSDeviceNotifications();  // without it the registry stays empty, nothing more
+  if (const auto error = service->listen()) return *error;
+  return service;
+}
+
+Service::~Service() {
+  idleExit_.reset();
+  if (listener_) listener_->invalidate();
+  manager_->stop();
+  manager_.reset();
+  pool_.waitUntilIdle();  // the last share of a device may be a task's, and devices need what goes next
+}
+
+std::optional<SystemError> Service::listen() {
+  auto listener = connections_.namedListener(*folder_, "manager");
+  if (!listener.ok()) return listener.error();
+  listener_ = *std::move(listener);
+  listener_->setDelegate(manager_);
+  listener_->resume();
+  if (connections_.startedByActivation()) exitWhenIdle();
+  return std::nullopt;
+}
+
+void Service::exitWhenIdle() {
+  idleExit_ = std::make_unique<IdleExit>(
+      mainLoop_, transactions_, settings_.idleTime.value_or(kDefaultIdleTime),
+      [this](std::function<void(bool)> answer) { connections_.stopAcceptingIfIdle(std::move(answer)); });
+}
+
+DeviceServices Service::deviceServices() {
+  return {pool_,
+          systemFiles(),
+          power_,
+          &access_,
+          [this]() -> std::shared_ptr<zeph::Listener> {
+            auto listener = connections_.anonymousListener(*folder_);
+            if (listener.ok()) return *std::move(listener);
+            OVLogError("brivodevice", "{}", listener.error().text());
+            return nullptr;
+          },
+          [this](const AuditToken& token) { return identity_.codeSigningIdentifier(token); },
+          [this] { return readPropertyListFile(settings_.findDataFile(kMatchingList)); },
+          volumeStatistics};
+}
+
+}  // namespace brivo

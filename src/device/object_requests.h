@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <map>
+#include <memory>
+
+#include "content/brivo_item.h"
+#include "content/media/brivo_file.h"
+#include "device/device_notifications.h"
+#include "device/object_index.h"
+#include "platform/base/value.h"
+
+namespace brivo {
+
+/// Serves the requests for single objects. Each answers exactly once; what a request's options held comes
+/// back in its result where docs/wire.md says so. *Thread-bound* to the device's operation queue.
+class ObjectRequests {
+ public:
+  /// All must outlive this.
+  ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications)
+      : index_(index), notifications_(notifications) {}
+
+  void requestMetadataForObjectHandle(std::uint64_t handle, const Dictionary& options,
+                                      const ResultHandler& reply);
+  void requestThumbnailDataForObjectHandle(std::uint64_t handle, const Dictionary& options,
+                                           const ResultHandler& reply);
+  /// Always refused: clients read ranges.
+  static void requestDownloadObjectHandle(const Dictionary& options, const ResultHandler& reply);
+  /// A byte range, or, with the stream options, opens or closes the object's stream for the process `client`.
+  void requestReadDataFromObjectHandle(std::uint64_t handle, const Dictionary& options, std::int32_t client,
+                                       const ResultHandler& reply);
+  void requestDeleteObjectHandle(std::uint64_t handle, const Dictionary& options, const ResultHandler& reply);
+
+  /// Closes the streams that a client process left open, so that the volume can be unmounted.
+  void closeStreamsOf(std::int32_t client);
+
+ private:
+  struct Range {
+    std::uint64_t offset;
+    std::uint64_t length;
+    std::int32_t code;
+  };
+  /// The range that the options ask for, and whether the object has it.
+  static Range rangeOf(const Dictionary& options, std::uint64_t size);
+
+  void openStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client);
+  void closeStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client);
+  Data read(BrivoFile& file, const Range& range) const;
+
+  ObjectIndex& index_;
+  const DeviceNotifications& notifications_;
+  /// Files by the process that has them open, once for each time.
+  std::multimap<std::int32_t, std::shared_ptr<BrivoFile>> openStreams_;
+};
+
+}  // namespace brivo

@@ -35,7 +35,11 @@ AuditToken AuditToken::ofPeer(int fd) {
   return AuditToken(credentials.pid, credentials.uid, std::move(pidfd));
 }
 
-AuditToken AuditToken::ofThisProcess() { return AuditToken(::getpid(), ::getuid(), openPidfd(::getpid())); }
+AuditToken AuditToken::ofProcess(std::int32_t pid, std::uint32_t uid) {
+  return AuditToken(pid, uid, openPidfd(pid));
+}
+
+AuditToken AuditToken::ofThisProcess() { return ofProcess(::getpid(), ::getuid()); }
 
 bool AuditToken::isAlive() const {
   pollfd exit{pidfd(), POLLIN, 0};

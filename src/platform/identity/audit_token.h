@@ -17,6 +17,8 @@ class AuditToken {
   /// SO_PEERPIDFD (Linux 6.5), else pidfd_open(2) of the credential's process identifier, which
   /// leaves a window in which that could already be another process. Call it right after accept(2).
   static AuditToken ofPeer(int fd);
+  /// The process that has the identifier now, which the caller must know to be the right one.
+  static AuditToken ofProcess(std::int32_t pid, std::uint32_t uid);
   static AuditToken ofThisProcess();
 
   /// -1 when the kernel did not tell.

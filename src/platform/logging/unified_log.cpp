@@ -49,6 +49,10 @@ bool debugWanted() {
 
 }  // namespace
 
+std::atomic<bool> UnifiedLog::silenced = false;
+
+void UnifiedLog::silence() { silenced = true; }
+
 UnifiedLog::UnifiedLog(std::string subsystem, std::string category)
     : subsystem_(std::move(subsystem)),
       category_(std::move(category)),

@@ -2,6 +2,7 @@
 // The system log: the journal when standard error is connected to it, else standard error.
 #pragma once
 
+#include <atomic>
 #include <string>
 #include <string_view>
 
@@ -20,8 +21,12 @@ class UnifiedLog {
   const std::string& subsystem() const { return subsystem_; }
   const std::string& category() const { return category_; }
 
+  /// Drops every line of this process from now on, unless the environment asks for debug lines. For programs
+  /// that are not services and speak to their user themselves.
+  static void silence();
+
   /// Debug lines are dropped unless the environment has BRIVOD_DEBUG set to something but "0".
-  bool enabled(LogLevel level) const { return level != LogLevel::debug || debug_; }
+  bool enabled(LogLevel level) const { return debug_ || (level != LogLevel::debug && !silenced); }
   /// Writes `line` with its priority (sd-daemon(3) prefixes on standard error, PRIORITY in the
   /// journal). Control characters in it are shown escaped, so that it stays one line.
   void write(LogLevel level, std::string_view line) const;
@@ -31,6 +36,8 @@ class UnifiedLog {
   void writeToJournal(int priority, std::string_view line) const;
 
   friend class LogRing;
+
+  static std::atomic<bool> silenced;
 
   const std::string subsystem_;
   const std::string category_;

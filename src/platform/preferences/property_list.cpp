@@ -7,7 +7,7 @@
 #include <pugixml.hpp>
 #include <sstream>
 
-#include "platform/preferences/base64.h"
+#include "platform/base/base64.h"
 
 namespace brivo {
 

@@ -8,6 +8,14 @@
 
 namespace brivo {
 
+namespace {
+
+thread_local Pool* currentPool = nullptr;
+
+}  // namespace
+
+Pool* Pool::ofThisThread() { return currentPool; }
+
 std::size_t Pool::defaultThreadCount() {
   return std::max<std::size_t>(2, std::thread::hardware_concurrency());
 }
@@ -65,6 +73,7 @@ void Pool::addThread() {
 
 void Pool::work() {
   setThreadName("pool");
+  currentPool = this;
   mutex_.lock();
   while (true) {
     if (!queue_.empty()) {

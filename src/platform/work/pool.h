@@ -32,6 +32,9 @@ class Pool {
   Pool(const Pool&) = delete;
   Pool& operator=(const Pool&) = delete;
 
+  /// The pool that the calling thread belongs to, or null.
+  static Pool* ofThisThread();
+
   /// Never blocks on running tasks. The task is destroyed on the thread that ran it.
   void post(Task task) BRIVO_EXCLUDES(mutex_);
 

@@ -3,8 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/preferences/base64.h"
-
 namespace brivo {
 namespace {
 
@@ -75,24 +73,6 @@ TEST(PropertyListTest, RefusesBottomlessNesting) {
   for (int i = 0; i < 100; ++i) closed += "<array>";
   for (int i = 0; i < 100; ++i) closed += "</array>";
   EXPECT_FALSE(parsePropertyList(list(closed + "</dict>")));
-}
-
-TEST(Base64Test, KnownAnswers) {
-  // RFC 4648, section 10.
-  const std::pair<const char*, const char*> vectors[] = {{"", ""},
-                                                         {"f", "Zg=="},
-                                                         {"fo", "Zm8="},
-                                                         {"foo", "Zm9v"},
-                                                         {"foob", "Zm9vYg=="},
-                                                         {"fooba", "Zm9vYmE="},
-                                                         {"foobar", "Zm9vYmFy"}};
-  for (const auto& [plain, encoded] : vectors) {
-    EXPECT_EQ(encodeBase64(Data::copyOf(plain).bytes()), encoded);
-    const auto decoded = decodeBase64(encoded);
-    ASSERT_TRUE(decoded);
-    EXPECT_EQ(Data(*decoded).text(), plain);
-  }
-  EXPECT_FALSE(decodeBase64("Zm9*"));
 }
 
 }  // namespace

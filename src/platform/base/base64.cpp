@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-#include "platform/preferences/base64.h"
+#include "platform/base/base64.h"
 
 #include <cstdint>
 

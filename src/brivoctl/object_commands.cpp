@@ -1,0 +1,161 @@
+// SPDX-License-Identifier: MIT
+// ls, read, get, rm
+#include <fmt/core.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <filesystem>
+#include <optional>
+
+#include "brivoctl/command.h"
+#include "brivoctl/output.h"
+#include "brivoctl/selection.h"
+#include "platform/base/base64.h"
+
+namespace brivoctl {
+
+namespace {
+
+ExitCode list(const CommonOptions& common, const std::string& selector) {
+  const auto selected = openDevice(common, selector);
+  if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
+  const auto catalogue = std::get<0>(selected).device->catalogue(common.wait());
+  if (!catalogue.ok()) return report(catalogue.error());
+  if (common.json) {
+    Json objects = Json::array();
+    for (const auto& object : *catalogue) objects.push_back(jsonOf(object.info()));
+    printJson(objects);
+    return kSuccess;
+  }
+  for (const auto& object : *catalogue) {
+    const orvid::ObjectInfo& info = object.info();
+    fmt::print("{:>8}  {:>10}  {}  {}{}\n", info.handle, info.isFolder ? "-" : shownSize(info.size),
+               shownTime(info.captured), shown(info.path), info.isFolder ? "/" : "");
+  }
+  return kSuccess;
+}
+
+struct ReadOptions {
+  std::vector<std::string> arguments;
+  std::uint64_t offset = 0;
+  std::optional<std::uint64_t> length;
+};
+
+ExitCode read(const CommonOptions& common, const ReadOptions& options) {
+  const auto selected = openObjects(common, options.arguments);
+  if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
+  const auto& objects = std::get<0>(selected).objects;
+  if (objects.size() != 1) return fail("read takes one object", kUsage);
+  const orvid::Object& object = objects.front();
+  const std::uint64_t size = object.info().size;
+  if (options.offset > size) return fail("the offset is beyond the object's end");
+  std::uint64_t left = options.length.value_or(size - options.offset);
+  std::vector<std::byte> all;  // for JSON alone
+  for (std::uint64_t offset = options.offset; left > 0;) {
+    const auto piece = object.read(offset, std::min(left, orvid::Object::kLongestRead), common.wait());
+    if (!piece.ok()) return report(piece.error());
+    if (piece->empty()) return fail("the medium gave no more bytes");
+    if (common.json) {
+      all.insert(all.end(), piece->bytes().begin(), piece->bytes().end());
+    } else if (std::fwrite(piece->bytes().data(), 1, piece->size(), stdout) != piece->size()) {
+      return fail("cannot write to standard output");
+    }
+    offset += piece->size();
+    left -= piece->size();
+  }
+  if (common.json) {
+    printJson(
+        {{"handle", object.info().handle}, {"offset", options.offset}, {"data", brivo::encodeBase64(all)}});
+  }
+  return std::fflush(stdout) == 0 ? kSuccess : fail("cannot write to standard output");
+}
+
+struct GetOptions {
+  std::vector<std::string> arguments;
+  std::string folder = ".";
+  bool force = false;
+};
+
+ExitCode save(const CommonOptions& common, const orvid::Object& object, const GetOptions& options) {
+  const std::filesystem::path path = std::filesystem::path(options.folder) / object.info().name;
+  if (object.info().isFolder) return fail(shown(object.info().path) + " is a folder");
+  if (object.info().name.find('/') != std::string::npos || object.info().name.starts_with('.')) {
+    return fail("the name of " + shown(object.info().path) + " is no name for a file here");
+  }
+  if (!options.force && std::filesystem::exists(path)) {
+    return fail(shown(path.string()) + " is there already; --force replaces it");
+  }
+  const auto saved = object.save(path.string(), nullptr, common.wait());
+  if (!saved.ok()) return report(saved.error());
+  if (common.json) {
+    printJsonLine({{"handle", object.info().handle},
+                   {"path", object.info().path},
+                   {"file", path.string()},
+                   {"size", object.info().size}});
+  } else {
+    fmt::print("{}  {}\n", shown(path.string()), shownSize(object.info().size));
+  }
+  return kSuccess;
+}
+
+ExitCode get(const CommonOptions& common, const GetOptions& options) {
+  const auto selected = openObjects(common, options.arguments);
+  if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
+  std::error_code error;
+  std::filesystem::create_directories(options.folder, error);
+  if (error) return fail(fmt::format("cannot make {}: {}", shown(options.folder), error.message()));
+  ExitCode worst = kSuccess;
+  for (const auto& object : std::get<0>(selected).objects) {
+    worst = std::max(worst, save(common, object, options));
+  }
+  return worst;
+}
+
+ExitCode remove(const CommonOptions& common, const std::vector<std::string>& arguments) {
+  const auto selected = openObjects(common, arguments);
+  if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
+  ExitCode worst = kSuccess;
+  for (const auto& object : std::get<0>(selected).objects) {
+    const auto removed = object.remove(common.wait());
+    if (!removed.ok()) worst = std::max(worst, report(removed.error()));
+    if (common.json) {
+      printJsonLine(
+          {{"handle", object.info().handle}, {"path", object.info().path}, {"deleted", removed.ok()}});
+    }
+  }
+  return worst;
+}
+
+}  // namespace
+
+void addObjectCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode) {
+  const auto add = [&](const char* name, const char* text) {
+    return addServiceCommand(app, common, name, text);
+  };
+  CLI::App* ls = add("ls", "List the objects of a device");
+  const auto device = std::make_shared<std::string>();
+  ls->add_option("DEVICE", *device, "Which device");
+  ls->callback([&common, &exitCode, device] { exitCode = list(common, *device); });
+
+  CLI::App* reading = add("read", "Write bytes of an object to standard output");
+  const auto readOptions = std::make_shared<ReadOptions>();
+  reading->add_option("OBJECT", readOptions->arguments, "[DEVICE] OBJECT")->required()->expected(1, 2);
+  reading->add_option("--offset", readOptions->offset, "Where to begin, in bytes");
+  reading->add_option("--length", readOptions->length, "How many bytes; to the end when left out");
+  reading->callback([&common, &exitCode, readOptions] { exitCode = read(common, *readOptions); });
+
+  CLI::App* getting = add("get", "Save objects as files");
+  const auto getOptions = std::make_shared<GetOptions>();
+  getting->add_option("OBJECT", getOptions->arguments, "[DEVICE] OBJECT...")->required();
+  getting->add_option("-d,--directory", getOptions->folder, "Where to put them")->capture_default_str();
+  getting->add_flag("--force", getOptions->force, "Replace files that are there already");
+  getting->callback([&common, &exitCode, getOptions] { exitCode = get(common, *getOptions); });
+
+  CLI::App* removing = add("rm", "Delete objects from the card");
+  const auto objects = std::make_shared<std::vector<std::string>>();
+  removing->add_option("OBJECT", *objects, "[DEVICE] OBJECT...")->required();
+  removing->callback([&common, &exitCode, objects] { exitCode = remove(common, *objects); });
+}
+
+}  // namespace brivoctl

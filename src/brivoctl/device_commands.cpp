@@ -66,7 +66,7 @@ class Watch {
   void follow(const orvid::DeviceInfo& info) {
     const auto opened = browser_->open(info, common_.wait());
     if (!opened.ok()) return (void)report(opened.error());
-    const auto device = *opened;
+    const auto& device = *opened;
     const std::string uuid = info.uuid;
     orvid::DeviceEvents events;
     events.onReady = [this, uuid](std::int32_t count) { say("ready", {{"device", uuid}, {"count", count}}); };
@@ -95,7 +95,7 @@ class Watch {
         common_.wait());
   }
 
-  void say(const char* event, Json details) {
+  void say(const char* event, const Json& details) {
     const std::lock_guard lock(mutex_);
     if (common_.json) {
       Json line = {{"event", event}};

@@ -14,7 +14,7 @@ void ContentEnumeration::enumerateContentWithOptions(const Dictionary& options,
                                                      const std::shared_ptr<zeph::Connection>& connection,
                                                      std::function<void()> done) {
   if (options.boolean(keys::kEnumerationPrioritizeSpeed).value_or(false)) prioritizeSpeed_ = true;
-  Progress progress;
+  auto progress = Progress::beginning;
   {
     const MutexLock lock(mutex_);
     progress = progress_;

@@ -115,8 +115,8 @@ void ObjectRequests::requestReadDataFromObjectHandle(std::uint64_t handle, const
 
 Data ObjectRequests::read(BrivoFile& file, const Range& range) const {
   if (!file.openStream()) return {};
-  const Data data = range.length < kTravellingMemory ? readIntoBuffer(file, range.offset, range.length)
-                                                     : readIntoMemoryFile(file, range.offset, range.length);
+  Data data = range.length < kTravellingMemory ? readIntoBuffer(file, range.offset, range.length)
+                                               : readIntoMemoryFile(file, range.offset, range.length);
   file.closeStream();
   return data;
 }

@@ -2,6 +2,7 @@
 #include "orvidcore/catalogue.h"
 
 #include <algorithm>
+#include <functional>
 
 #include "protocol/result_codes.h"
 #include "ptp/object_info_dataset.h"
@@ -63,7 +64,7 @@ std::string Catalogue::pathOf(const ObjectInfo& info) const {
   for (int depth = 0; parent != brivo::kTopLevelParent && depth < kDeepestFolder; ++depth) {
     const auto folder = objects_.find(parent);
     if (folder == objects_.end()) break;
-    path = folder->second.name + "/" + path;
+    path.insert(0, folder->second.name + "/");
     parent = folder->second.parent;
   }
   return path;
@@ -92,7 +93,7 @@ std::vector<ObjectInfo> Catalogue::all() const {
     const brivo::MutexLock lock(mutex_);
     for (const auto& [handle, info] : objects_) infos.push_back(info);
   }
-  std::ranges::stable_partition(infos, &ObjectInfo::isFolder);
+  std::stable_partition(infos.begin(), infos.end(), std::mem_fn(&ObjectInfo::isFolder));
   return infos;
 }
 

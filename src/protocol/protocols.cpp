@@ -9,35 +9,35 @@ namespace {
 
 using zeph::Member;
 using enum Member::Kind;
-constexpr auto declaredOnly = Member::Serving::declaredOnly;
+constexpr auto kDeclaredOnly = Member::Serving::declaredOnly;
 
 constexpr Member kManagerMembers[] = {
     {selectors::kRequestDeviceList, method, "", "a{sv}", "deviceList,"},
     {selectors::kOpenDevice, method, "s", "a{sv}", "uuid,device,"},
-    {selectors::kCloseDevice, method, "s", "a{sv}", "uuid,result,", declaredOnly},
+    {selectors::kCloseDevice, method, "s", "a{sv}", "uuid,result,", kDeclaredOnly},
     {selectors::kNotifyAddedDevice, signal, "a{sv}", "", "deviceContext,"},
     {selectors::kNotifyRemovedDevice, signal, "a{sv}", "", "deviceContext,"},
 };
 
 constexpr Member kKorvelMembers[] = {
-    {selectors::kOpenDeviceSession, method, "", "", "", declaredOnly},
-    {selectors::kSendPTPCommand, method, "", "", "", declaredOnly},
+    {selectors::kOpenDeviceSession, method, "", "", "", kDeclaredOnly},
+    {selectors::kSendPTPCommand, method, "", "", "", kDeclaredOnly},
     {selectors::kRequestMetadata, method, "ta{sv}", "a{sv}", "handle,options,metadata,"},
     {selectors::kRequestThumbnail, method, "ta{sv}", "a{sv}", "handle,options,thumbnail,"},
     {selectors::kRequestDownload, method, "ta{sv}", "a{sv}", "handle,options,result,"},
     {selectors::kRequestReadData, method, "ta{sv}", "a{sv}", "handle,options,result,"},
-    {selectors::kOrvidEvent, signal, "v", "", "event,", declaredOnly},
+    {selectors::kOrvidEvent, signal, "v", "", "event,", kDeclaredOnly},
     {selectors::kRequestDelete, method, "ta{sv}", "a{sv}", "handle,options,result,"},
     {selectors::kRequestStartUsing, method, "", "a{sv}", "properties,"},
     {selectors::kEnumerateContent, method, "a{sv}", "", "options,"},
-    {selectors::kPtpEventForwarding, method, "", "", "", declaredOnly},
+    {selectors::kPtpEventForwarding, method, "", "", "", kDeclaredOnly},
     {selectors::kRegisterInterests, method, "as", "", "types,"},
     {selectors::kUnregisterInterests, method, "as", "", "types,"},
     {selectors::kPostNotification, signal, "a{sv}", "", "note,"},
     {selectors::kNotifyAddedItems, signal, "a{sv}", "", "batch,"},
-    {selectors::kNotifyPtpEvent, signal, "v", "", "event,", declaredOnly},
+    {selectors::kNotifyPtpEvent, signal, "v", "", "event,", kDeclaredOnly},
     {selectors::kNotifyPercentCompleted, signal, "u", "", "percent,"},
-    {selectors::kNotifyDeviceClose, signal, "v", "", "location,", declaredOnly},
+    {selectors::kNotifyDeviceClose, signal, "v", "", "location,", kDeclaredOnly},
 };
 
 constexpr zeph::Protocol kManagerProtocol{"org.orvid.OVZEPHDeviceManagerProtocol", kManagerMembers};

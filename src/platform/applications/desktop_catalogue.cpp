@@ -20,7 +20,7 @@ namespace brivo {
 namespace {
 
 constexpr int kDeepestFolder = 4;
-constexpr std::streamsize kLargestFile = 256 * 1024;
+constexpr std::streamsize kLargestFile = 262'144;
 /// A folder that changed less than this before it was read may change again without its time telling.
 constexpr std::int64_t kTimeGranularity = 2'000'000'000;
 

@@ -107,7 +107,7 @@ bool operator==(const Dictionary& a, const Dictionary& b) {
 namespace {
 
 template <class T>
-constexpr bool isNumber = std::is_arithmetic_v<T>;
+constexpr bool kIsNumber = std::is_arithmetic_v<T>;
 
 template <class Integer>
 Integer truncated(double value) {
@@ -127,7 +127,7 @@ std::int64_t toSigned(std::uint64_t value) {
 template <class Result, class Convert>
 std::optional<Result> number(const Value& value, Convert convert) {
   return value.visit([&]<class T>(const T& held) -> std::optional<Result> {
-    if constexpr (isNumber<T>) {
+    if constexpr (kIsNumber<T>) {
       return convert(held);
     } else {
       return std::nullopt;
@@ -181,7 +181,7 @@ Value::Class Value::valueClass() const {
     Class operator()(const Dictionary&) const { return Class::dictionary; }
   } classOf;
   return visit([&]<class T>(const T& held) {
-    if constexpr (isNumber<T>) {
+    if constexpr (kIsNumber<T>) {
       return Class::number;
     } else {
       return classOf(held);

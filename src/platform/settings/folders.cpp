@@ -18,9 +18,9 @@ std::optional<SystemError> makePrivateFolder(const std::string& path) {
 }
 
 std::optional<SystemError> makeBaseDirectory(const std::string& path) {
-  const auto error = makePrivateFolder(path);
+  auto error = makePrivateFolder(path);
   if (!error || error->code != ENOENT || path.size() < 2) return error;
-  if (const auto above = makeBaseDirectory(std::string(parentPath(path)))) return above;
+  if (auto above = makeBaseDirectory(std::string(parentPath(path)))) return above;
   return makePrivateFolder(path);
 }
 

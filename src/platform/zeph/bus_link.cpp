@@ -231,8 +231,8 @@ void BusLink::rearm() {
   if (ended_) return;
   const int events = sd_bus_get_events(bus_);
   if (events >= 0) {
-    const int wanted = reading_ ? events : events & ~EPOLLIN;
-    sd_event_source_set_io_events(io_, static_cast<std::uint32_t>(wanted));
+    const auto wanted = static_cast<std::uint32_t>(events);
+    sd_event_source_set_io_events(io_, reading_ ? wanted : wanted & ~std::uint32_t{EPOLLIN});
   }
   std::uint64_t due = UINT64_MAX;
   if (reading_ && sd_bus_get_timeout(bus_, &due) > 0) {

@@ -370,7 +370,7 @@ std::size_t weightOf(const Value& value) {
   }
   if (const auto* dictionary = value.get<Dictionary>()) {
     std::size_t sum = kPerValue;
-    for (const auto& [key, entry] : *dictionary) sum += sizeof(key) + key.size() + weightOf(entry);
+    for (const auto& [key, entry] : *dictionary) sum += sizeof(std::string) + key.size() + weightOf(entry);
     return sum;
   }
   return kPerValue;

@@ -133,7 +133,7 @@ void addAccessCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode)
   access->footer(
       "An application is known by its Flatpak or snap name, by its desktop file, or by the absolute path of "
       "its "
-      "program. Grants count from the application's next connection on.");
+      "program. Grants count from the application's next start on.");
   const auto add = [&](const char* name, const char* text) {
     CLI::App* command = access->add_subcommand(name, text);
     command->add_flag("--json", common.json, "Print JSON");

@@ -1,28 +1,49 @@
 # SPDX-License-Identifier: MIT
 """A client in a process of its own: takes lines of JSON from its standard input, [method, argument...], and answers
 each with {"result": ...} or {"error": text}."""
+import concurrent.futures
+import functools
 import json
+import socket
 import sys
-import time
 
-from harness import Device, Manager, wait_until
+from gi.repository import GLib
+from harness import Device, Manager, connect_raw, wait_until
 
 
 class Client:
     def __init__(self, address):
         self.address = address
-        self.manager = Manager(self)
         self.device = None
+
+    @functools.cached_property
+    def manager(self):
+        return Manager(self)
 
     def open(self, path):
         self.device = Device(self.manager, path)
         return self.device.properties
+
+    def is_let_in(self, path):
+        self.manager.wait_for_device(path)
+        try:
+            self.open(path)
+            return True
+        except GLib.Error:
+            return False
 
     def enumerate(self):
         self.device.enumerate()
 
     def wait_for(self, *names):
         return {name: d.handle for name, d in self.device.wait_for(*names).items()}
+
+    def handles(self, count):
+        """The handles of that many objects, once they have arrived; each may come more than once."""
+        def arrived():
+            found = {dataset.handle for dataset in self.device.datasets()}
+            return found if len(found) >= count else None
+        return sorted(wait_until(arrived, f"{count} objects"))
 
     def batch_names(self):
         return [[dataset.filename for dataset in batch] for batch in self.device.batches()]
@@ -37,14 +58,39 @@ class Client:
     def open_stream(self, handle):
         return self.device.read(handle, OVReadBufferStreamOpen=True)["errCode"]
 
+    def connect_and_leave(self, times):
+        """Connects to the manager's socket that often and hangs up without a word."""
+        def connect(_):
+            connect_raw(self.path).close()
+        with concurrent.futures.ThreadPoolExecutor(16) as pool:
+            list(pool.map(connect, range(times)))
+
+    def say(self, hexadecimal, and_end=False):
+        """Sends bytes to the manager's socket; true when the service hangs up."""
+        raw = connect_raw(self.path)
+        try:
+            raw.sendall(bytes.fromhex(hexadecimal))
+            if and_end:
+                raw.shutdown(socket.SHUT_WR)
+            while raw.recv(65536):
+                pass
+        except (BrokenPipeError, ConnectionResetError):
+            pass
+        except socket.timeout:
+            return False
+        finally:
+            raw.close()
+        return True
+
+    @property
+    def path(self):
+        return self.address.removeprefix("unix:path=")
+
     def wait_until_closed(self):
         return wait_until(self.device.closed.is_set, "the end of the connection")
 
     def removed(self):
         return wait_until(lambda: self.manager.named("notifyRemovedDevice"), "a removal") and True
-
-    def sleep(self, seconds):
-        time.sleep(seconds)
 
 
 def main():

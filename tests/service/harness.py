@@ -122,16 +122,24 @@ class Service:
         return os.listdir(f"/proc/{self.process.pid}/fd")
 
     def descriptors_below(self, path):
+        return [target for target in self.targets() if target.startswith(path)]
+
+    def targets(self):
+        """What the open descriptors are, without the timers that come with the first deadline."""
         found = []
         for fd in self.descriptors():
             with contextlib.suppress(OSError):
-                target = os.readlink(f"/proc/{self.process.pid}/fd/{fd}")
-                if target.startswith(path):
-                    found.append(target)
-        return found
+                found.append(os.readlink(f"/proc/{self.process.pid}/fd/{fd}"))
+        return [target for target in found if target != "anon_inode:[timerfd]"]
 
     def threads(self):
-        return len(os.listdir(f"/proc/{self.process.pid}/task"))
+        """The names of its threads."""
+        found = []
+        for thread in os.listdir(f"/proc/{self.process.pid}/task"):
+            with contextlib.suppress(FileNotFoundError), \
+                    open(f"/proc/{self.process.pid}/task/{thread}/comm", encoding="utf-8") as name:
+                found.append(name.read().strip())
+        return found
 
     def resident_kilobytes(self):
         with open(f"/proc/{self.process.pid}/status", encoding="ascii") as status:
@@ -250,6 +258,7 @@ class Device(Connection):
         context = manager.wait_for_device(path)
         self.handle = context["OVDeviceHandle"]
         self.opened = manager.open(self.handle)
+        self._batches = []
         super().__init__(self.opened["OVDeviceEndpoint"], KORVEL, **options)
         self.properties = self.start_using() if start else None
 
@@ -285,8 +294,9 @@ class Device(Connection):
 
     def batches(self):
         """The datasets of each content batch."""
-        return [[Dataset(data) for data in unpacked(arguments, None)["OVMSObjectInfoArray"]]
-                for arguments in self.named("notifyAddedItems")]
+        for arguments in self.named("notifyAddedItems")[len(self._batches):]:
+            self._batches.append([Dataset(data) for data in unpacked(arguments, None)["OVMSObjectInfoArray"]])
+        return self._batches
 
     def datasets(self):
         return [dataset for batch in self.batches() for dataset in batch]
@@ -405,8 +415,15 @@ class ClientProcess:
                                         stdout=subprocess.PIPE, text=True, env={**os.environ, "BRIVOD_BUILD": BUILD})
 
     def ask(self, method, *arguments):
+        self.tell(method, *arguments)
+        return self.answer()
+
+    def tell(self, method, *arguments):
+        """Asks and leaves the answer for later."""
         self.process.stdin.write(json.dumps([method, *arguments]) + "\n")
         self.process.stdin.flush()
+
+    def answer(self):
         answer = json.loads(self.process.stdout.readline() or '{"error": "the client ended"}')
         if "error" in answer:
             raise AssertionError(answer["error"])
@@ -417,7 +434,8 @@ class ClientProcess:
         self.process.wait()
 
     def close(self):
-        self.process.stdin.close()
+        with contextlib.suppress(BrokenPipeError):
+            self.process.stdin.close()
         self.process.wait(WAIT)
         self.process.stdout.close()
 
@@ -429,6 +447,6 @@ def grants_in(database):
 
 def connect_raw(path):
     raw = socket.socket(socket.AF_UNIX)
+    raw.connect(path)  # waits while the backlog is full, as it would not with a time limit
     raw.settimeout(WAIT)
-    raw.connect(path)
     return raw

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "platform/applications/desktop_catalogue.h"
 
-#include <dirent.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -10,9 +9,9 @@
 #include <cstdlib>
 #include <fstream>
 #include <iterator>
-#include <memory>
 
 #include "platform/applications/desktop_entry.h"
+#include "platform/base/directory.h"
 #include "platform/base/paths.h"
 
 namespace brivo {
@@ -120,7 +119,7 @@ void DesktopCatalogue::refresh() const {
 void DesktopCatalogue::readFolder(const std::string& folder, const std::string& prefix, bool ofUser) const {
   if (folders_.contains(folder) || std::ranges::count(prefix, '-') >= kDeepestFolder) return;
   folders_[folder] = changeTime(folder);
-  const std::unique_ptr<DIR, int (*)(DIR*)> directory(::opendir(folder.c_str()), &::closedir);
+  const Directory directory = listDirectory(folder);
   if (!directory) return;
   std::vector<std::string> names;
   while (const dirent* entry = ::readdir(directory.get())) names.emplace_back(entry->d_name);

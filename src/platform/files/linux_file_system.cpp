@@ -1,5 +1,4 @@
 // SPDX-License-Identifier: MIT
-#include <dirent.h>
 #include <fcntl.h>
 #include <linux/openat2.h>
 #include <sys/stat.h>
@@ -7,9 +6,9 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <memory>
 #include <optional>
 
+#include "platform/base/directory.h"
 #include "platform/base/paths.h"
 #include "platform/files/file_system.h"
 
@@ -55,13 +54,8 @@ std::optional<ResourceValues> valuesAt(int folder, const char* name) {
   return values;
 }
 
-using Directory = std::unique_ptr<DIR, int (*)(DIR*)>;
-
 Directory openDirectory(const std::string& path) {
-  UniqueFd fd = openWithoutLinks(path, O_RDONLY | O_DIRECTORY | O_NONBLOCK);
-  DIR* directory = fd ? ::fdopendir(fd.get()) : nullptr;
-  if (directory) (void)fd.release();
-  return {directory, &::closedir};
+  return listDirectory(openWithoutLinks(path, O_RDONLY | O_DIRECTORY | O_NONBLOCK));
 }
 
 /// Calls `visit` with each name that is not hidden; an error when the listing breaks off.

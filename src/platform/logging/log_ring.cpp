@@ -5,6 +5,8 @@
 
 #include <utility>
 
+#include "platform/work/thread_name.h"
+
 namespace brivo {
 
 namespace {
@@ -40,6 +42,7 @@ void LogRing::push(const UnifiedLog& log, LogLevel level, std::string line) {
 }
 
 void LogRing::writeLines() {
+  setThreadName("log");
   mutex_.lock();
   while (true) {
     if (lines_.empty()) {

@@ -1,15 +1,14 @@
 // SPDX-License-Identifier: MIT
 #include "platform/volumes/volume_scan.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <fmt/format.h>
 #include <sys/stat.h>
 
 #include <algorithm>
-#include <memory>
 #include <optional>
 
+#include "platform/base/directory.h"
 #include "platform/base/paths.h"
 #include "platform/files/file_system.h"
 #include "platform/text/unicode.h"
@@ -80,7 +79,7 @@ std::vector<VolumeCandidate> mountedCandidates(const std::vector<Mount>& table,
 
 std::vector<VolumeCandidate> folderCandidates(const std::string& folder) {
   std::vector<VolumeCandidate> candidates;
-  const std::unique_ptr<DIR, int (*)(DIR*)> directory(::opendir(folder.c_str()), &::closedir);
+  const Directory directory = listDirectory(folder);
   if (!directory) return candidates;
   while (const dirent* entry = ::readdir(directory.get())) {
     if (entry->d_name[0] == '.') continue;

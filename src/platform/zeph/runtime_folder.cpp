@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "platform/zeph/runtime_folder.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/stat.h>
@@ -10,12 +9,14 @@
 #include <cerrno>
 #include <string_view>
 
+#include "platform/base/directory.h"
+
 namespace brivo::zeph {
 
 namespace {
 
 void removeSockets(const std::string& path) {
-  const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir(path.c_str()), &::closedir);
+  const Directory folder = listDirectory(path);
   if (!folder) return;
   while (const dirent* entry = ::readdir(folder.get())) {
     const std::string_view name = entry->d_name;

@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <string>
+
+namespace brivo::bench {
+
+/// What the command line of a benchmark asks for.
+struct Options {
+  /// Small cards and few repetitions, to try the program out.
+  bool quick = false;
+
+  /// Reads "[--quick] [--folder FOLDER]"; prints the usage and ends the program for anything else. Cards and
+  /// everything else are made in FOLDER, by default in $TMPDIR, else in /var/tmp.
+  static Options fromCommandLine(int count, char** words);
+
+  /// `full`, or `small` when the run is a quick one.
+  template <class T>
+  T pick(T full, T small) const {
+    return quick ? small : full;
+  }
+};
+
+}  // namespace brivo::bench

@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: MIT
+#include "wire_session.h"
+
+#include <stdexcept>
+
+#include "figures.h"
+#include "support/raw_dbus.h"
+#include "support/wait.h"
+
+namespace brivo::bench {
+
+namespace {
+
+/// What the name of every file begins with, in the UTF-16 of a dataset.
+constexpr std::string_view kBeginOfName("I\0M\0G\0_\0", 8);
+
+}  // namespace
+
+WireSession::WireSession(const Card& card)
+    : card_(card),
+      service_(card.volumes()),
+      manager_(WireClient::authenticated(service_.managerSocket())),
+      device_(openDevice()) {
+  device_.call(kDeviceInterface, "requestStartUsingDeviceWithReply");
+}
+
+WireClient WireSession::openDevice() {
+  std::string devices;
+  const auto listsTheCard = [&] {
+    devices = manager_.call(kManagerInterface, "requestDeviceListWithReply");
+    return devices.find(card_.path()) != std::string::npos;
+  };
+  if (!test::waitUntil(listsTheCard)) throw std::runtime_error("no device for " + card_.path());
+  const std::string handle = test::marshalledString(textUnder("OVDeviceHandle", devices));
+  const std::string opened = manager_.call(kManagerInterface, "openDevice_withReply", "s", handle);
+  const std::string address = textUnder("OVDeviceEndpoint", opened);
+  return WireClient::authenticated(address.substr(address.find('/')));
+}
+
+double WireSession::enumerate() {
+  const Stopwatch watch;
+  device_.post(kDeviceInterface, "enumerateContentWithOptions", "a{sv}", noOptions());
+  device_.receiveUntil(kBeginOfName, card_.files());
+  return watch.milliseconds();
+}
+
+std::string noOptions() {
+  return std::string(8, '\0');  // the length, and the alignment of entries
+}
+
+}  // namespace brivo::bench

@@ -1,0 +1,38 @@
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <memory>
+
+#include "card.h"
+#include "service_process.h"
+#include "wire_client.h"
+
+namespace brivo::bench {
+
+inline constexpr const char* kManagerInterface = "org.orvid.OVZEPHDeviceManagerProtocol";
+inline constexpr const char* kDeviceInterface = "org.orvid.KorvelProtocol";
+
+/// One card behind a service process that has just been started, opened and started by a WireClient.
+class WireSession {
+ public:
+  /// `card` must outlive this. Throws when the device cannot be opened.
+  explicit WireSession(const Card& card);
+
+  const ServiceProcess& service() const { return service_; }
+  WireClient& device() { return device_; }
+  /// Asks for the catalogue and reads until all files of the card have come; gives the milliseconds.
+  double enumerate();
+
+ private:
+  WireClient openDevice();
+
+  const Card& card_;
+  const ServiceProcess service_;
+  WireClient manager_;
+  WireClient device_;
+};
+
+/// A marshalled dictionary without entries.
+std::string noOptions();
+
+}  // namespace brivo::bench

@@ -5,6 +5,12 @@
 
 namespace brivo {
 
+namespace {
+
+thread_local const SerialQueue* current = nullptr;
+
+}  // namespace
+
 std::shared_ptr<SerialQueue> SerialQueue::create(Pool& pool) {
   return std::shared_ptr<SerialQueue>(new SerialQueue(pool));
 }
@@ -29,6 +35,8 @@ void SerialQueue::runAndWait(const Task& task) {
   done.acquire();
 }
 
+bool SerialQueue::runsHere() const { return current == this; }
+
 void SerialQueue::schedule() {
   pool_.post([self = shared_from_this()] { self->drain(); });
 }
@@ -46,7 +54,9 @@ void SerialQueue::drain() {
       task = std::move(tasks_->front());
       tasks_->pop_front();
     }
+    current = this;
     task();
+    current = nullptr;
   }
   schedule();
 }

@@ -22,6 +22,8 @@ class SerialQueue : public std::enable_shared_from_this<SerialQueue> {
   void post(Task task) BRIVO_EXCLUDES(mutex_);
   /// Runs `task` here and returns when it has run. Must not be called from a task of this queue.
   void runAndWait(const Task& task);
+  /// True for a task of this queue.
+  bool runsHere() const;
 
  private:
   explicit SerialQueue(Pool& pool) : pool_(pool) {}

@@ -10,6 +10,12 @@
 
 namespace brivo::zeph {
 
+namespace {
+
+constexpr std::chrono::milliseconds kLongestWait = std::chrono::hours(24 * 365);
+
+}  // namespace
+
 BusConnection::BusConnection(RunLoop& loop, std::shared_ptr<SerialQueue> queue, ConnectionObserver& observer,
                              UniqueFd socket, BusLink::Role role, AuditToken peer)
     : loop_(loop),
@@ -64,7 +70,9 @@ void BusConnection::call(std::string_view selector, Arguments arguments, std::ch
   const Member* member = remote_ ? remote_->protocol().withSelector(selector) : nullptr;
   const std::size_t size = weight(arguments);
   auto fail = onAnswer;
-  if (!member || !enqueue({OutgoingCall{member, std::move(arguments), timeout, std::move(onAnswer)}, size})) {
+  const auto deadline = Clock::now() + std::min(timeout, kLongestWait);
+  if (!member ||
+      !enqueue({OutgoingCall{member, std::move(arguments), deadline, std::move(onAnswer)}, size})) {
     fail(CallError{kErrorDisconnected, "The connection has ended"});
   }
 }
@@ -83,6 +91,7 @@ bool BusConnection::enqueue(Outgoing message) {
   }
   {
     const MutexLock lock(mutex_);
+    if (over_) return false;  // whoever ends the connection has taken what waited
     outgoing_.push_back(std::move(message));
     if (std::exchange(linkWoken_, true)) return true;
   }

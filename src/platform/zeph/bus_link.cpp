@@ -100,6 +100,11 @@ BusLink::~BusLink() {
     owner_.answered(std::move(call->onAnswer), CallError{kErrorDisconnected, "The connection ended"});
   }
   callsToHear_.clear();
+  for (Outgoing& waiting : toPut_) {
+    if (auto* call = std::get_if<OutgoingCall>(&waiting.message)) {
+      owner_.answered(std::move(call->onAnswer), CallError{kErrorDisconnected, "The connection ended"});
+    }
+  }
   if (bus_) sd_bus_close(bus_);
   sd_bus_unref(bus_);
   sd_event_unref(event_);
@@ -183,6 +188,7 @@ void BusLink::turn() {
   }
   if (result > 0 && reading_) sd_event_source_set_enabled(again_, SD_EVENT_ONESHOT);
   refill();
+  giveUpLateCalls();
   rearm();
 }
 
@@ -227,6 +233,36 @@ void BusLink::refill() {
   sd_event_source_set_enabled(again_, SD_EVENT_ONESHOT);  // others first
 }
 
+void BusLink::giveUpLateCalls() {
+  if (ended_ || role_ == Role::service) return;
+  std::deque<Outgoing> more = owner_.takeOutgoing(kMessagesPerTurn);
+  std::ranges::move(more, std::back_inserter(toPut_));
+  const auto now = std::chrono::steady_clock::now();
+  std::size_t messages = 0;
+  std::size_t bytes = 0;
+  std::erase_if(toPut_, [&](Outgoing& waiting) {
+    auto* call = std::get_if<OutgoingCall>(&waiting.message);
+    if (!call || call->deadline > now) return false;
+    owner_.answered(std::move(call->onAnswer),
+                    CallError{kErrorNoReply, "The call could not be sent in time"});
+    ++messages;
+    bytes += waiting.weight;
+    return true;
+  });
+  if (messages > 0) owner_.left(messages, bytes);
+}
+
+std::uint64_t BusLink::firstDeadline() const {
+  auto first = std::chrono::steady_clock::time_point::max();
+  for (const Outgoing& waiting : toPut_) {
+    const auto* call = std::get_if<OutgoingCall>(&waiting.message);
+    if (call) first = std::min(first, call->deadline);
+  }
+  if (first == std::chrono::steady_clock::time_point::max()) return UINT64_MAX;
+  return static_cast<std::uint64_t>(
+      std::chrono::ceil<std::chrono::microseconds>(first.time_since_epoch()).count());
+}
+
 void BusLink::rearm() {
   if (ended_) return;
   const int events = sd_bus_get_events(bus_);
@@ -235,7 +271,9 @@ void BusLink::rearm() {
     sd_event_source_set_io_events(io_, reading_ ? wanted : wanted & ~std::uint32_t{EPOLLIN});
   }
   std::uint64_t due = UINT64_MAX;
-  if (reading_ && sd_bus_get_timeout(bus_, &due) > 0) {
+  if (reading_) (void)sd_bus_get_timeout(bus_, &due);
+  if (role_ == Role::client) due = std::min(due, firstDeadline());
+  if (due != UINT64_MAX) {
     sd_event_source_set_time(timer_, due);
     sd_event_source_set_enabled(timer_, SD_EVENT_ONESHOT);
   } else {
@@ -320,9 +358,10 @@ int BusLink::put(OutgoingCall& call) {
     answeredCall->link.onAnswer(*answeredCall, reply);
     return 0;
   };
-  const auto microseconds = std::chrono::microseconds(call.timeout).count();
+  const auto left =
+      std::chrono::duration_cast<std::chrono::microseconds>(call.deadline - std::chrono::steady_clock::now());
   result = sd_bus_call_async(bus_, &pending->slot, message.get(), onReply, pending.get(),
-                             static_cast<std::uint64_t>(microseconds));
+                             static_cast<std::uint64_t>(std::max<std::int64_t>(left.count(), 1)));
   if (result < 0) {
     owner_.answered(std::move(pending->onAnswer), CallError{kErrorDisconnected, errorText(result)});
     return result;
@@ -338,6 +377,8 @@ void BusLink::onAnswer(PendingCall& call, sd_bus_message* message) {
   const auto answer = [&]() -> Answer {
     if (sd_bus_message_is_method_error(message, nullptr)) {
       const sd_bus_error* error = sd_bus_message_get_error(message);
+      // What sd-bus says of calls that were waiting when the peer hung up is what it says of late answers.
+      if (sd_bus_is_open(bus_) <= 0) return CallError{kErrorDisconnected, "The connection ended"};
       return CallError{error->name ? error->name : kErrorFailed, error->message ? error->message : ""};
     }
     auto values = readArguments(message, true);

@@ -72,6 +72,11 @@ class BusLink {
   void rearm();
   void end(const std::string& why);
 
+  /// Gives up calls that were due before they could be put on the wire.
+  void giveUpLateCalls();
+  /// When the first of those is due, on the clock of sd_bus_get_timeout(3).
+  std::uint64_t firstDeadline() const;
+
   int put(const OutgoingSignal& signal);
   int put(OutgoingAnswer& answer);
   int put(OutgoingCall& call);

@@ -34,14 +34,17 @@ bool mayConnect(const AuditToken& peer) {
 Result<UniqueFd> BusListener::bind(const std::string& path) {
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
-  if (path.size() >= sizeof address.sun_path) return SystemError{"socket path too long: " + path};
-  std::memcpy(address.sun_path, path.c_str(), path.size() + 1);
+  // Under its own name it appears when it listens: whoever sees it can connect.
+  const std::string before = path + "~";
+  if (before.size() >= sizeof address.sun_path) return SystemError{"socket path too long: " + path};
+  std::memcpy(address.sun_path, before.c_str(), before.size() + 1);
   UniqueFd socket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
   if (!socket) return SystemError{"make a socket", errno};
-  ::unlink(path.c_str());
+  ::unlink(before.c_str());
   // The folder is closed to others; the mode matters to those who look at it.
   if (::bind(socket.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
-      ::chmod(path.c_str(), 0600) != 0 || ::listen(socket.get(), kBacklog) != 0) {
+      ::chmod(before.c_str(), 0600) != 0 || ::listen(socket.get(), kBacklog) != 0 ||
+      ::rename(before.c_str(), path.c_str()) != 0) {
     return SystemError{"listen at " + path, errno};
   }
   refuseDescriptors(socket);

@@ -27,7 +27,7 @@ struct OutgoingAnswer {
 struct OutgoingCall {
   const Member* member;
   Arguments arguments;
-  std::chrono::milliseconds timeout;
+  std::chrono::steady_clock::time_point deadline;  ///< of the answer
   AnswerHandler onAnswer;
 };
 

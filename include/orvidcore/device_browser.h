@@ -27,7 +27,8 @@ class DeviceBrowser {
   /// Connects to the service at a D-Bus address, or where the service of this user is when it is empty.
   static Result<std::shared_ptr<DeviceBrowser>> connect(const std::string& address = "",
                                                         Timeout timeout = kDefaultTimeout);
-  /// Ends the connection and the sessions of the devices that it opened.
+  /// Ends the connection and the sessions of the devices that it opened. When it returns, no event is being
+  /// told any more, except the one that it is called from.
   ~DeviceBrowser();
   DeviceBrowser(const DeviceBrowser&) = delete;
   DeviceBrowser& operator=(const DeviceBrowser&) = delete;

@@ -85,8 +85,8 @@ ExitCode listGrants(const CommonOptions& common) {
     return kSuccess;
   }
   for (const Json& row : list) {
-    fmt::print("{:<10}  {}\n", row["granted"].get<bool>() ? "granted" : "unconfirmed",
-               shown(row["identifier"].get<std::string>()));
+    printLine(fmt::format("{:<10}  {}", row["granted"].get<bool>() ? "granted" : "unconfirmed",
+                          shown(row["identifier"].get<std::string>())));
   }
   return kSuccess;
 }
@@ -120,7 +120,7 @@ ExitCode whoAmI(const CommonOptions& common) {
   if (common.json) {
     printJson({{"identifier", *identifier}, {"builtIn", builtIn}});
   } else {
-    fmt::print("{}{}\n", shown(*identifier), builtIn ? "  (built in: always has access)" : "");
+    printLine(fmt::format("{}{}", shown(*identifier), builtIn ? "  (built in: always has access)" : ""));
   }
   return kSuccess;
 }

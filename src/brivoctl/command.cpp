@@ -3,10 +3,30 @@
 
 #include <fmt/core.h>
 
+#include <charconv>
+#include <cstdio>
+#include <system_error>
+
 namespace brivoctl {
 
+namespace {
+
+constexpr double kMostSeconds = 86'400;
+
+/// What is wrong with `argument` as a time to wait; empty when nothing is.
+std::string secondsError(const std::string& argument) {
+  double seconds = -1;
+  const char* end = argument.data() + argument.size();
+  const auto parsed = std::from_chars(argument.data(), end, seconds);
+  const bool isTime =
+      parsed.ec == std::errc() && parsed.ptr == end && seconds >= 0 && seconds <= kMostSeconds;
+  return isTime ? "" : argument + " is no number of seconds from 0 to 86400";
+}
+
+}  // namespace
+
 ExitCode fail(const std::string& text, ExitCode code) {
-  fmt::print(stderr, "brivoctl: {}\n", text);
+  std::fputs(("brivoctl: " + text + "\n").c_str(), stderr);
   return code;
 }
 
@@ -25,7 +45,9 @@ CLI::App* addServiceCommand(CLI::App& app, CommonOptions& common, const char* na
   CLI::App* command = app.add_subcommand(name, text);
   command->add_flag("--json", common.json, "Print JSON");
   command->add_option("--address", common.address, "D-Bus address of the service");
-  command->add_option("--timeout", common.timeout, "Seconds to wait for each answer")->capture_default_str();
+  command->add_option("--timeout", common.timeout, "Seconds to wait for each answer")
+      ->check(secondsError)
+      ->capture_default_str();
   return command;
 }
 

@@ -4,6 +4,7 @@
 
 #include <atomic>
 #include <csignal>
+#include <cstdio>
 #include <mutex>
 
 #include "brivoctl/command.h"
@@ -25,9 +26,9 @@ ExitCode listDevices(const CommonOptions& common) {
     printJson(list);
     return kSuccess;
   }
-  if (devices->empty()) fmt::print(stderr, "no camera devices\n");
+  if (devices->empty()) std::fputs("no camera devices\n", stderr);
   for (const auto& device : *devices) {
-    fmt::print("{}  {:<20}  {}\n", device.uuid, shown(device.name), shown(device.mountPath));
+    printLine(fmt::format("{}  {:<20}  {}", device.uuid, shown(device.name), shown(device.mountPath)));
   }
   return kSuccess;
 }
@@ -38,22 +39,20 @@ class Watch {
   Watch(const CommonOptions& common, bool devicesOnly) : common_(common), devicesOnly_(devicesOnly) {}
 
   ExitCode run() {
-    brivo::RunLoop loop;
-    loop.onSignals({SIGINT, SIGTERM}, [&] { loop.quit(); });
+    loop_.onSignals({SIGINT, SIGTERM}, [this] { loop_.quit(); });
     auto browser = orvid::DeviceBrowser::connect(common_.address, common_.wait());
     if (!browser.ok()) return report(browser.error());
     browser_ = *std::move(browser);
     browser_->setEvents({[this](const orvid::DeviceInfo& device) { added(device); },
                          [this](const orvid::DeviceInfo& device) { say("removed", jsonOf(device)); },
-                         [this, &loop] {
+                         [this] {
                            serviceGone_ = true;
-                           loop.quit();
+                           loop_.quit();
                          }});
     const auto devices = browser_->devices(common_.wait());
     if (!devices.ok()) return report(devices.error());
     for (const auto& device : *devices) added(device);
-    loop.run();
-    browser_.reset();
+    loop_.run();
     return serviceGone_ ? fail("the service has gone", kNoService) : kSuccess;
   }
 
@@ -100,10 +99,11 @@ class Watch {
     if (common_.json) {
       Json line = {{"event", event}};
       line.update(details);
-      return printJsonLine(line);
+      printJsonLine(line);
+    } else {
+      printLine(fmt::format("{:<8} {}", event, summary(event, details)));
     }
-    fmt::print("{:<8} {}\n", event, summary(event, details));
-    std::fflush(stdout);
+    if (outputFailed()) loop_.quit();
   }
 
   static std::string summary(const std::string& event, const Json& details) {
@@ -125,6 +125,8 @@ class Watch {
   const bool devicesOnly_;
   std::mutex mutex_;
   std::atomic<bool> serviceGone_ = false;
+  brivo::RunLoop loop_;
+  /// Last, because it ends first: its events use the others.
   std::shared_ptr<orvid::DeviceBrowser> browser_;
 };
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 // brivoctl: the camera service on the command line.
 #include "brivoctl/command.h"
+#include "brivoctl/output.h"
 #include "platform/logging/unified_log.h"
 
 int main(int argc, char** argv) {
@@ -25,5 +26,6 @@ int main(int argc, char** argv) {
   } catch (const CLI::ParseError& error) {
     return app.exit(error) == 0 ? kSuccess : kUsage;
   }
+  if (exitCode == kSuccess && outputFailed()) return fail("cannot write to standard output");
   return exitCode;
 }

@@ -30,8 +30,8 @@ ExitCode list(const CommonOptions& common, const std::string& selector) {
   }
   for (const auto& object : *catalogue) {
     const orvid::ObjectInfo& info = object.info();
-    fmt::print("{:>8}  {:>10}  {}  {}{}\n", info.handle, info.isFolder ? "-" : shownSize(info.size),
-               shownTime(info.captured), shown(info.path), info.isFolder ? "/" : "");
+    printLine(fmt::format("{:>8}  {:>10}  {}  {}{}", info.handle, info.isFolder ? "-" : shownSize(info.size),
+                          shownTime(info.captured), shown(info.path), info.isFolder ? "/" : ""));
   }
   return kSuccess;
 }
@@ -94,7 +94,7 @@ ExitCode save(const CommonOptions& common, const orvid::Object& object, const Ge
                    {"file", path.string()},
                    {"size", object.info().size}});
   } else {
-    fmt::print("{}  {}\n", shown(path.string()), shownSize(object.info().size));
+    printLine(fmt::format("{}  {}", shown(path.string()), shownSize(object.info().size)));
   }
   return kSuccess;
 }
@@ -141,7 +141,8 @@ void addObjectCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode)
   CLI::App* reading = add("read", "Write bytes of an object to standard output");
   const auto readOptions = std::make_shared<ReadOptions>();
   reading->add_option("OBJECT", readOptions->arguments, "[DEVICE] OBJECT")->required()->expected(1, 2);
-  reading->add_option("--offset", readOptions->offset, "Where to begin, in bytes");
+  reading->add_option("--offset", readOptions->offset, "Where to begin, in bytes")
+      ->check(CLI::NonNegativeNumber);
   reading->add_option("--length", readOptions->length, "How many bytes; to the end when left out");
   reading->callback([&common, &exitCode, readOptions] { exitCode = read(common, *readOptions); });
 

@@ -33,18 +33,18 @@ Json jsonOf(const orvid::ObjectInfo& object) {
           {"protected", object.isProtected}};
 }
 
-namespace {
+void printLine(const std::string& line) { std::fputs((line + "\n").c_str(), stdout); }
 
-void print(const std::string& text) {
-  fmt::print("{}\n", text);
-  std::fflush(stdout);
+bool outputFailed() { return std::fflush(stdout) != 0 || std::ferror(stdout) != 0; }
+
+void printJson(const Json& document) {
+  printLine(document.dump(2, ' ', false, Json::error_handler_t::replace));
 }
 
-}  // namespace
-
-void printJson(const Json& document) { print(document.dump(2, ' ', false, Json::error_handler_t::replace)); }
-
-void printJsonLine(const Json& line) { print(line.dump(-1, ' ', false, Json::error_handler_t::replace)); }
+void printJsonLine(const Json& line) {
+  printLine(line.dump(-1, ' ', false, Json::error_handler_t::replace));
+  std::fflush(stdout);  // who reads JSON lines wants each when it comes
+}
 
 std::string shown(const std::string& text) { return brivo::escapingControls(text); }
 

@@ -14,6 +14,11 @@ using Json = nlohmann::ordered_json;
 Json jsonOf(const orvid::DeviceInfo& device);
 Json jsonOf(const orvid::ObjectInfo& object);
 
+/// A line on standard output. Whether that worked is for outputFailed() to tell.
+void printLine(const std::string& line);
+/// Writes what standard output still holds; true when that or anything before failed.
+bool outputFailed();
+
 /// Prints one document, or one line of JSON lines. Bytes that are no UTF-8 become replacement characters.
 void printJson(const Json& document);
 void printJsonLine(const Json& line);

@@ -15,8 +15,8 @@ namespace brivoctl {
 template <class T>
 using Selected = std::variant<T, ExitCode>;
 
-/// The device that `selector` means among `devices`; of none or several a usage error. An empty selector
-/// means the only one.
+/// The device that `selector` means among `devices`; of several a usage error, of none a failure. An empty
+/// selector means the only one.
 Selected<orvid::DeviceInfo> chooseDevice(const std::vector<orvid::DeviceInfo>& devices,
                                          const std::string& selector);
 

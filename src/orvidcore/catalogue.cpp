@@ -49,10 +49,10 @@ std::vector<ObjectInfo> Catalogue::add(const brivo::Array& datasets) {
     const auto* data = value.get<brivo::Data>();
     if (!data || !brivo::MSObjectInfoDataset::isComplete(data->bytes())) continue;
     ObjectInfo info = infoOf(brivo::MSObjectInfoDataset(*data));
-    info.path = pathOf(info);
     added.push_back(info);
     objects_.insert_or_assign(info.handle, std::move(info));
   }
+  for (ObjectInfo& info : added) info.path = pathOf(info);
   lastArrival_ = Clock::now();
   changed_.notify_all();
   return added;
@@ -70,6 +70,11 @@ std::string Catalogue::pathOf(const ObjectInfo& info) const {
   return path;
 }
 
+ObjectInfo Catalogue::withPath(ObjectInfo info) const {
+  info.path = pathOf(info);
+  return info;
+}
+
 void Catalogue::remove(std::uint32_t handle) {
   const brivo::MutexLock lock(mutex_);
   objects_.erase(handle);
@@ -84,30 +89,39 @@ void Catalogue::close() {
 std::optional<ObjectInfo> Catalogue::find(std::uint32_t handle) const {
   const brivo::MutexLock lock(mutex_);
   const auto found = objects_.find(handle);
-  return found == objects_.end() ? std::nullopt : std::optional(found->second);
+  return found == objects_.end() ? std::nullopt : std::optional(withPath(found->second));
 }
 
 std::vector<ObjectInfo> Catalogue::all() const {
   std::vector<ObjectInfo> infos;
   {
     const brivo::MutexLock lock(mutex_);
-    for (const auto& [handle, info] : objects_) infos.push_back(info);
+    for (const auto& [handle, info] : objects_) infos.push_back(withPath(info));
   }
   std::stable_partition(infos.begin(), infos.end(), std::mem_fn(&ObjectInfo::isFolder));
   return infos;
 }
 
-bool Catalogue::waitUntilSettled(Timeout timeout) {
+Catalogue::Wait Catalogue::waitUntilSettled(Timeout timeout) {
   const auto deadline = Clock::now() + timeout;
-  bool settled = false;
+  auto outcome = Wait::tooLong;
   mutex_.lock();
-  while (!settled && !closed_ && Clock::now() < deadline) {
+  while (true) {
+    const auto now = Clock::now();
     const auto quiet = expected_ ? lastArrival_ + kQuietTime : deadline;
-    settled = expected_ && (objects_.size() >= *expected_ || Clock::now() >= quiet);
-    if (!settled) changed_.wait_until(mutex_, std::min(quiet, deadline));
+    if (closed_) {
+      outcome = Wait::closed;
+      break;
+    }
+    if (expected_ && (objects_.size() >= *expected_ || now >= quiet)) {
+      outcome = Wait::settled;
+      break;
+    }
+    if (now >= deadline) break;
+    changed_.wait_until(mutex_, std::min(quiet, deadline));
   }
   mutex_.unlock();
-  return settled;
+  return outcome;
 }
 
 }  // namespace orvid

@@ -30,13 +30,16 @@ class Catalogue {
   std::optional<ObjectInfo> find(std::uint32_t handle) const BRIVO_EXCLUDES(mutex_);
   /// Folders, then files, each in the order of their handles.
   std::vector<ObjectInfo> all() const BRIVO_EXCLUDES(mutex_);
-  /// Waits until it has settled; false when it has not in time or was closed before.
-  bool waitUntilSettled(Timeout timeout) BRIVO_EXCLUDES(mutex_);
+  enum class Wait { settled, tooLong, closed };
+  /// Waits until it has settled or was closed, at most for `timeout`.
+  Wait waitUntilSettled(Timeout timeout) BRIVO_EXCLUDES(mutex_);
 
  private:
   using Clock = std::chrono::steady_clock;
 
+  /// From the folders that have arrived by now; kept objects have none, because theirs may come later.
   std::string pathOf(const ObjectInfo& info) const BRIVO_REQUIRES(mutex_);
+  ObjectInfo withPath(ObjectInfo info) const BRIVO_REQUIRES(mutex_);
 
   mutable brivo::Mutex mutex_;
   std::condition_variable_any changed_;

@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: MIT
 #include "orvidcore/device_browser.h"
 
+#include <chrono>
+#include <condition_variable>
 #include <map>
+#include <set>
 
 #include "orvidcore/runtime.h"
 #include "orvidcore/session.h"
@@ -78,7 +81,14 @@ class DeviceBrowser::Implementation final : public brivo::zeph::ExportedObject,
       const brivo::MutexLock lock(mutex_);
       sessions.swap(sessions_);
     }
-    for (const auto& [uuid, session] : sessions) session->close();
+    setEvents({});
+    for (const auto& [uuid, session] : sessions) {
+      session->close();
+      session->ended();
+    }
+    // Who made the browser may take down what its events refer to.
+    for (const auto& [uuid, session] : sessions) session->waitForEvents();
+    if (!events_->runsHere()) events_->runAndWait([] {});
   }
 
   void setEvents(BrowserEvents events) {
@@ -93,19 +103,26 @@ class DeviceBrowser::Implementation final : public brivo::zeph::ExportedObject,
          });
   }
 
-  /// Blocking.
+  /// Blocking. A process may connect to a device once: who asks while another thread opens it waits for that.
   Result<std::shared_ptr<Device>> open(const DeviceInfo& device, Timeout timeout) {
-    if (auto known = knownSession(device.uuid)) return std::make_shared<Device>(std::move(known));
-    const auto reply = blocking<Dictionary>(
-        [&](auto handler) { call(selectors::kOpenDevice, {device.uuid}, timeout, std::move(handler)); });
-    if (!reply.ok()) return reply.error();
-    const auto* address = reply->string(keys::kDeviceEndpoint);
-    if (!address) return Error{ErrorKind::disconnected, 0, "there is no such device"};
-    auto session = Session::open(runtime_, device, {*address}, timeout);
-    if (!session.ok()) return session.error();
+    const auto deadline = std::chrono::steady_clock::now() + timeout;
+    {
+      const brivo::MutexLock lock(mutex_);
+      while (opening_.contains(device.uuid)) {
+        if (opened_.wait_until(mutex_, deadline) == std::cv_status::timeout)
+          return Error{ErrorKind::timedOut, 0, "no answer in time"};
+      }
+      const auto known = sessions_.find(device.uuid);
+      if (known != sessions_.end()) return std::make_shared<Device>(known->second);
+      opening_.insert(device.uuid);
+    }
+    auto session = connect(device, timeout);
     const brivo::MutexLock lock(mutex_);
-    const auto [entry, isNew] = sessions_.try_emplace(device.uuid, *session);
-    return std::make_shared<Device>(entry->second);
+    opening_.erase(device.uuid);
+    opened_.notify_all();
+    if (!session.ok()) return session.error();
+    sessions_.insert_or_assign(device.uuid, *session);
+    return std::make_shared<Device>(*std::move(session));
   }
 
   void runInBackground(brivo::Task task) { runtime_->pool().post(std::move(task)); }
@@ -125,6 +142,15 @@ class DeviceBrowser::Implementation final : public brivo::zeph::ExportedObject,
   }
 
  private:
+  Result<std::shared_ptr<Session>> connect(const DeviceInfo& device, Timeout timeout) {
+    const auto reply = blocking<Dictionary>(
+        [&](auto handler) { call(selectors::kOpenDevice, {device.uuid}, timeout, std::move(handler)); });
+    if (!reply.ok()) return reply.error();
+    const auto* address = reply->string(keys::kDeviceEndpoint);
+    if (!address) return Error{ErrorKind::disconnected, 0, "there is no such device"};
+    return Session::open(runtime_, device, {*address}, timeout);
+  }
+
   void call(std::string_view selector, brivo::zeph::Arguments arguments, Timeout timeout,
             Callback<Dictionary> handler) {
     connection_->remoteObjectProxyWithErrorHandler(nullptr).call(
@@ -137,19 +163,16 @@ class DeviceBrowser::Implementation final : public brivo::zeph::ExportedObject,
         });
   }
 
-  std::shared_ptr<Session> knownSession(const std::string& uuid) {
-    const brivo::MutexLock lock(mutex_);
-    const auto found = sessions_.find(uuid);
-    return found == sessions_.end() ? nullptr : found->second;
-  }
-
   void forget(const std::string& uuid) {
-    std::shared_ptr<Session> session;  // ends after the lock
-    const brivo::MutexLock lock(mutex_);
-    const auto found = sessions_.find(uuid);
-    if (found == sessions_.end()) return;
-    session = std::move(found->second);
-    sessions_.erase(found);
+    std::shared_ptr<Session> session;
+    {
+      const brivo::MutexLock lock(mutex_);
+      const auto found = sessions_.find(uuid);
+      if (found == sessions_.end()) return;
+      session = std::move(found->second);
+      sessions_.erase(found);
+    }
+    session->ended();
   }
 
   void post(std::function<void(const BrowserEvents&)> tell) {
@@ -173,6 +196,8 @@ class DeviceBrowser::Implementation final : public brivo::zeph::ExportedObject,
   std::shared_ptr<const BrowserEvents> told_ BRIVO_GUARDED_BY(mutex_) =
       std::make_shared<const BrowserEvents>();
   std::map<std::string, std::shared_ptr<Session>> sessions_ BRIVO_GUARDED_BY(mutex_);
+  std::set<std::string> opening_ BRIVO_GUARDED_BY(mutex_);
+  std::condition_variable_any opened_;
 };
 
 Result<std::shared_ptr<DeviceBrowser>> DeviceBrowser::connect(const std::string& address, Timeout timeout) {

@@ -101,11 +101,13 @@ void Session::call(std::string_view selector, brivo::zeph::Arguments arguments, 
           return handler(*answer);
         }
         Error error = errorOf(answer.error());
-        if (error.kind == ErrorKind::disconnected && !self->answered_) {
-          error = {ErrorKind::refused, 0, "this application may not use the device"};
-        }
-        handler(std::move(error));
+        handler(error.kind == ErrorKind::disconnected ? self->ending() : std::move(error));
       });
+}
+
+Error Session::ending() const {
+  if (answered_) return {ErrorKind::disconnected, 0, "the connection ended"};
+  return {ErrorKind::refused, 0, "this application may not use the device"};
 }
 
 void Session::request(std::string_view selector, std::uint32_t handle, Dictionary options, Timeout timeout,
@@ -128,9 +130,10 @@ void Session::start(Timeout timeout, Callback<Dictionary> handler) {
 }
 
 void Session::enumerate(const Dictionary& options, Timeout timeout, Callback<Done> handler) {
-  enumerated_ = true;
   call(selectors::kEnumerateContent, {options}, timeout,
-       [handler = std::move(handler)](const Result<brivo::zeph::Arguments>& answer) {
+       [self = shared_from_this(),
+        handler = std::move(handler)](const Result<brivo::zeph::Arguments>& answer) {
+         if (answer.ok()) self->enumerated_ = true;
          handler(answer.ok() ? Result<Done>(Done()) : Result<Done>(answer.error()));
        });
 }
@@ -144,9 +147,14 @@ Result<Done> Session::settle(Timeout timeout) {
     if (!begun.ok()) return begun.error();
   }
   const auto left = std::chrono::duration_cast<Timeout>(deadline - std::chrono::steady_clock::now());
-  if (!catalogue_.waitUntilSettled(left))
-    return Error{ErrorKind::timedOut, 0, "the catalogue did not arrive in time"};
-  return Done();
+  switch (catalogue_.waitUntilSettled(left)) {
+    case Catalogue::Wait::closed:
+      return ending();
+    case Catalogue::Wait::tooLong:
+      return Error{ErrorKind::timedOut, 0, "the catalogue did not arrive in time"};
+    default:
+      return Done();
+  }
 }
 
 // ------------------------------------------------------------------------------------------------ receiving
@@ -195,23 +203,29 @@ void Session::receivedNote(const Dictionary& note) {
 }
 
 void Session::ended() {
+  if (ended_.exchange(true)) return;
   catalogue_.close();
-  post([](const DeviceEvents& events) {
-    if (events.onClosed) events.onClosed();
+  // The last event finds the session alive, whoever has let go of it meanwhile.
+  events_->post([self = shared_from_this()] {
+    const auto events = self->told();
+    if (events->onClosed) events->onClosed();
   });
 }
 
+void Session::waitForEvents() {
+  if (!events_->runsHere()) events_->runAndWait([] {});
+}
+
 void Session::post(std::function<void(const DeviceEvents&)> tell) {
+  if (ended_) return;
   events_->post([weak = weak_from_this(), tell = std::move(tell)] {
-    const auto self = weak.lock();
-    if (!self) return;
-    std::shared_ptr<const DeviceEvents> events;
-    {
-      const brivo::MutexLock lock(self->mutex_);
-      events = self->told_;
-    }
-    tell(*events);
+    if (const auto self = weak.lock()) tell(*self->told());
   });
+}
+
+std::shared_ptr<const DeviceEvents> Session::told() const {
+  const brivo::MutexLock lock(mutex_);
+  return told_;
 }
 
 }  // namespace orvid

@@ -27,6 +27,10 @@ class Session final : public brivo::zeph::ExportedObject, public std::enable_sha
   Catalogue& catalogue() { return catalogue_; }
   void setEvents(DeviceEvents events) BRIVO_EXCLUDES(mutex_);
   void close() { connection_->invalidate(); }
+  /// The device has gone: what is called from now on fails, and the last event is told. Once; then nothing.
+  void ended();
+  /// Waits until no event is being told any more, after ended().
+  void waitForEvents();
 
   /// Calls the device; a connection that ends before its first answer was refused.
   void call(std::string_view selector, brivo::zeph::Arguments arguments, Timeout timeout, Handler handler);
@@ -57,9 +61,11 @@ class Session final : public brivo::zeph::ExportedObject, public std::enable_sha
 
   void receivedNote(const Dictionary& note);
   void receivedItems(const Dictionary& batch);
-  void ended();
+  /// What calls come to when the connection has ended.
+  Error ending() const;
   /// Runs `tell` with the events on their queue.
   void post(std::function<void(const DeviceEvents&)> tell);
+  std::shared_ptr<const DeviceEvents> told() const BRIVO_EXCLUDES(mutex_);
 
   const std::shared_ptr<Runtime> runtime_;
   const DeviceInfo info_;
@@ -68,8 +74,9 @@ class Session final : public brivo::zeph::ExportedObject, public std::enable_sha
   Catalogue catalogue_;
   std::atomic<bool> answered_ = false;
   std::atomic<bool> enumerated_ = false;
+  std::atomic<bool> ended_ = false;
 
-  brivo::Mutex mutex_;
+  mutable brivo::Mutex mutex_;
   std::shared_ptr<const DeviceEvents> told_ BRIVO_GUARDED_BY(mutex_) = std::make_shared<const DeviceEvents>();
 };
 

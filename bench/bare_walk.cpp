@@ -68,13 +68,16 @@ std::size_t countNames(const std::string& card) {
   return names;
 }
 
-std::size_t walkWithValues(const std::string& card) {
+std::size_t walkWithValues(const std::string& card, const std::function<void()>& eachFile) {
   const std::string media = card + "/DCIM";
   askValues(openWithoutLinks(media, O_PATH).get(), "", AT_EMPTY_PATH);
   std::size_t files = 0;
   for (const std::string& folder :
        foldersOf(media, [](int fd, const char*name) { askValues(fd, name, 0); })) {
-    forEachName(folder, [&](int fd, const char* name) { files += askValues(fd, name, 0) ? 1 : 0; });
+    forEachName(folder, [&](int fd, const char* name) {
+      files += askValues(fd, name, 0) ? 1 : 0;
+      eachFile();
+    });
   }
   return files;
 }

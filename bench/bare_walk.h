@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <string>
 
 namespace brivo::bench {
@@ -19,7 +20,9 @@ namespace brivo::bench {
 
 /// Counts; the number of names below the folders in DCIM. Throws when something cannot be listed.
 std::size_t countNames(const std::string& card);
-/// Walks; the number of files whose values could be had. Throws when something cannot be listed.
-std::size_t walkWithValues(const std::string& card);
+/// Walks, and calls `eachFile` after it has got the values of one; the number of files whose values could be
+/// had. Throws when something cannot be listed.
+std::size_t walkWithValues(
+    const std::string& card, const std::function<void()>& eachFile = [] {});
 
 }  // namespace brivo::bench

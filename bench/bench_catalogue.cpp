@@ -1,11 +1,14 @@
 // SPDX-License-Identifier: MIT
 // How long a catalogue takes, how it grows, and what it costs in memory.
+#include <sys/socket.h>
+
 #include <algorithm>
 #include <cstdio>
 #include <exception>
 #include <stdexcept>
 
 #include "bare_walk.h"
+#include "echo_process.h"
 #include "in_process_catalogue.h"
 #include "options.h"
 #include "remote_catalogue.h"
@@ -15,6 +18,8 @@ namespace brivo::bench {
 namespace {
 
 constexpr double kMostOverBareWalk = 1.5;
+/// What a batch of one file takes on the wire.
+constexpr std::size_t kBatchBytes = 400;
 constexpr double kFirstBatchMilliseconds = 10;
 constexpr double kMostOverBareListing = 2;
 constexpr double kLeastGrowth = 0.8;
@@ -38,29 +43,47 @@ double timeOfBareWalk(const Card& card) {
   });
 }
 
+/// The same, and each file told in a message of its own to a process that reads; until it has read all.
+double timeOfBareWalkWithSends(const Card& card) {
+  const std::string message(kBatchBytes, '.');
+  EchoProcess reader(message.size() * card.files(), ".");
+  const UniqueFd socket = reader.takeSocket();
+  return millisecondsOf([&] {
+    check(countNames(card.path()) == card.files());
+    check(walkWithValues(card.path(), [&] {
+            check(::send(socket.get(), message.data(), message.size(), MSG_NOSIGNAL) > 0);
+          }) == card.files());
+    char done = 0;
+    check(::recv(socket.get(), &done, 1, 0) == 1);
+  });
+}
+
 std::string filesOf(const Card& card) { return grouped(card.files()) + " files"; }
 
-/// Times of one way to have the catalogue made, each with that of a bare walk just before.
+/// Times of one way to have the catalogue made, each with that of a bare loop just before.
 class Comparison {
  public:
-  Comparison(std::string what, const Card& card) : what_(std::move(what)), card_(card) {}
+  Comparison(std::string what, std::string bareWhat, double (*bare)(const Card&), const Card& card)
+      : what_(std::move(what)), bareWhat_(std::move(bareWhat)), timeOfBare_(bare), card_(card) {}
 
   /// `catalogue` gives its milliseconds.
   template <class Catalogue>
   void add(Catalogue catalogue) {
     timeOfBareWalk(card_);
-    bare_.push_back(timeOfBareWalk(card_));
+    bare_.push_back(timeOfBare_(card_));
     times_.push_back(catalogue());
   }
   void print() const {
     const double ratio = medianRatio(times_, bare_);
-    printFigure("bare walk before it", inMilliseconds(median(bare_)), 1);
+    printFigure(bareWhat_, inMilliseconds(median(bare_)), 1);
     printFigure(what_ + ", " + filesOf(card_), inMilliseconds(median(times_)), ratio,
                 atMost(kMostOverBareWalk, ratio));
   }
 
  private:
   const std::string what_;
+  const std::string bareWhat_;
+  double (*const timeOfBare_)(const Card&);
   const Card& card_;
   std::vector<double> bare_, times_;
 };
@@ -68,9 +91,12 @@ class Comparison {
 /// The whole catalogue, against the bare walk. Each repetition has a fresh device.
 void compareWithBareWalk(const Options& options) {
   const Card card(options.pick<std::size_t>(20'000, 2'000));
-  Comparison within("catalogue in process", card);
-  Comparison wire("catalogue over the socket, client only reads", card);
-  Comparison library("catalogue over the socket, OrvidCore", card);
+  const auto sending = [&](const char* what) {
+    return Comparison(what, "bare walk, a message for each file", timeOfBareWalkWithSends, card);
+  };
+  Comparison within("catalogue in process", "bare walk", timeOfBareWalk, card);
+  Comparison wire = sending("catalogue over the socket, client only reads");
+  Comparison library = sending("catalogue over the socket, OrvidCore");
   InProcessCatalogue inProcess;
   for (int i = 0; i < options.pick(15, 3); ++i) {
     within.add([&] { return inProcess.enumerate(card); });

@@ -83,25 +83,26 @@ std::vector<std::string> BrivoDevice::mediaPaths() const {
   return mediaPaths_;
 }
 
-std::string BrivoDevice::internalUUID() const {
-  const Dictionary properties = cameraDictionary();
-  const std::string* uuid = properties.string(keys::kInternalDeviceUUID);
-  return uuid ? *uuid : std::string();
+std::optional<std::string> BrivoDevice::textProperty(std::string_view key) const {
+  const MutexLock lock(propertiesLock_);
+  const std::string* text = cameraDictionary_.string(key);
+  return text ? std::optional(*text) : std::nullopt;
 }
 
-std::string BrivoDevice::name() const {
-  const Dictionary properties = cameraDictionary();
-  const std::string* name = properties.string(keys::kDeviceName);
-  return name ? *name : std::string();
+std::string BrivoDevice::internalUUID() const {
+  return textProperty(keys::kInternalDeviceUUID).value_or(std::string());
 }
+
+std::string BrivoDevice::name() const { return textProperty(keys::kDeviceName).value_or(std::string()); }
 
 std::optional<std::string> BrivoDevice::filesystemPath() const {
-  const Dictionary properties = cameraDictionary();
-  const std::string* path = properties.string(keys::kDeviceVolumePath);
-  return path ? std::optional(*path) : std::nullopt;
+  return textProperty(keys::kDeviceVolumePath);
 }
 
-bool BrivoDevice::isLocked() const { return cameraDictionary().boolean(keys::kDeviceLocked).value_or(false); }
+bool BrivoDevice::isLocked() const {
+  const MutexLock lock(propertiesLock_);
+  return cameraDictionary_.boolean(keys::kDeviceLocked).value_or(false);
+}
 
 std::optional<ContentEnumeration::Store> BrivoDevice::store() const {
   if (!cameraDictionary().contains(keys::kDeviceStarted)) return std::nullopt;

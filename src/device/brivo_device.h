@@ -117,6 +117,7 @@ class BrivoDevice final : public CameraDevice,
   /// The same, with the power assertion held around it.
   void addObjectRequest(Task request);
   void startUsing();
+  std::optional<std::string> textProperty(std::string_view key) const BRIVO_EXCLUDES(propertiesLock_);
   /// Sends one part of a replay, on the operation queue, and has the next follow when its client has read
   /// enough.
   void sendReplayPart(const std::shared_ptr<CatalogueReplay>& replay);

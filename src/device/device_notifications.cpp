@@ -72,9 +72,11 @@ void DeviceNotifications::flushNotifications(Array datasets) const {
 }
 
 Dictionary DeviceNotifications::contentBatch(Array datasets) const {
-  return dictionaryOf({{keys::kObjectInfoArray, std::move(datasets)},
-                       {keys::kNumberOfDownloadableObjects, counters_.msObjectCount()},
-                       {keys::kContentCatalogPercentCompleted, counters_.contentCatalogPercentCompleted()}});
+  Dictionary batch;
+  batch.set(keys::kObjectInfoArray, std::move(datasets));
+  batch.set(keys::kNumberOfDownloadableObjects, counters_.msObjectCount());
+  batch.set(keys::kContentCatalogPercentCompleted, counters_.contentCatalogPercentCompleted());
+  return batch;
 }
 
 }  // namespace brivo

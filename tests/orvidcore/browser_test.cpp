@@ -50,7 +50,6 @@ TEST_F(DeviceBrowserTest, EveryCardIsListedAndTheAsynchronousListIsTheSame) {
 }
 
 TEST_F(DeviceBrowserTest, DevicesThatComeAndGoAreToldInOrder) {
-  Recorder told;
   std::string handle;
   BrowserEvents events;
   events.onAdded = [&](const DeviceInfo& info) {

@@ -134,6 +134,7 @@ class ClientTest : public testing::Test {
   Object onlyFile(std::string_view content);
 
   RunningService service;
+  Recorder told;  // outlives the browser, whose events may come to its end
   std::shared_ptr<DeviceBrowser> browser;
   std::shared_ptr<Device> device;
 };

@@ -43,8 +43,6 @@ class DeviceTest : public ClientTest {
     service.addFile("CARD", "100ABCDE/IMG_0002.JPG", "the second");
     service.addFile("CARD", "101ABCDE/IMG_0003.JPG", "");
   }
-
-  Recorder told;
 };
 
 TEST_F(DeviceTest, StartingGivesTheProperties) {

@@ -156,7 +156,6 @@ TEST_F(SaveTest, SeveralSavesAtOnceDoNotDisturbEachOther) {
 
 TEST_F(SaveTest, ACardThatGoesDuringASaveEndsItAndNothingIsLeft) {
   const Object object = onlyFile(pattern(kNineMegabytes));
-  Recorder told;
   DeviceEvents events;
   events.onClosed = [&] { told.add("closed"); };
   device->setEvents(std::move(events));

@@ -141,6 +141,11 @@ class Service:
                 found.append(name.read().strip())
         return found
 
+    def is_instrumented(self):
+        """Whether a sanitizer watches it, and takes memory of its own for that."""
+        with open(f"/proc/{self.process.pid}/maps", encoding="utf-8") as maps:
+            return any(name in line for line in maps for name in ("libtsan", "libasan"))
+
     def resident_kilobytes(self):
         with open(f"/proc/{self.process.pid}/status", encoding="ascii") as status:
             return next(int(line.split()[1]) for line in status if line.startswith("VmRSS"))

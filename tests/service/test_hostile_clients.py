@@ -115,7 +115,6 @@ class ManyObjectsTest(ServiceTest):
         self.path = self.folder_card("CARD", files)
 
     def test_a_client_that_never_reads_is_ended_and_holds_up_nobody(self):
-        """It asks for the catalogue again and again and reads nothing."""
         manager = self.manager()
         device = self.device(manager, self.path)
         deaf = self.other_client()
@@ -125,7 +124,8 @@ class ManyObjectsTest(ServiceTest):
         device.enumerate()
         wait_until(lambda: len(device.signals) > 30_000 + 2, "the whole catalogue", 4 * WAIT)
         self.assertEqual(len(manager.devices()), 1)
-        self.assertLess(self.service.resident_kilobytes(), 200_000)
+        if not self.service.is_instrumented():
+            self.assertLess(self.service.resident_kilobytes(), 100_000)
 
     def test_two_clients_that_enumerate_at_once_get_the_same_catalogue(self):
         first, second = self.other_client(), self.other_client()

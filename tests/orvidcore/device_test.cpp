@@ -103,6 +103,7 @@ TEST_F(DeviceTest, ASecondCatalogueIsTheSameWithoutAnotherEnumeration) {
   const auto second = device->catalogue();
   ASSERT_TRUE(second.ok()) << second.error().text;
   EXPECT_EQ(pathsOf(*second), pathsOf(*first));
+  ASSERT_TRUE(told.waitFor("ready 6"));
   EXPECT_EQ(told.count("ready 6"), 1u);
 }
 

@@ -55,7 +55,7 @@ check "no text file speaks of the build tree" diff /dev/null <(of_the_build_tree
 
 # ------------------------------------------------------------------------------------------------- built against it
 found_by_cmake() {
-  cmake -S "$source/examples/cpp" -B "$work/cmake" -DCMAKE_PREFIX_PATH="$prefix" -DCMAKE_CXX_COMPILER="$compiler" &&
+  cmake -G Ninja -S "$source/examples/cpp" -B "$work/cmake" -DCMAKE_PREFIX_PATH="$prefix" -DCMAKE_CXX_COMPILER="$compiler" &&
     cmake --build "$work/cmake"
 }
 found_by_pkg_config() {

@@ -249,8 +249,9 @@ TEST_F(DeviceTest, AClosedDeviceHasNoCatalogueAnyMore) {
   record();
   service.removeCard("CARD");
   ASSERT_TRUE(told.waitFor("closed"));
+  const auto before = told.events();
   EXPECT_EQ(kindOf(device->catalogue()), ErrorKind::disconnected);
-  EXPECT_THAT(told.events(), SizeIs(1)) << "nothing was sent again";
+  EXPECT_EQ(told.events(), before) << "nothing was sent again";
 }
 
 }  // namespace

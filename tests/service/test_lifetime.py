@@ -104,6 +104,7 @@ class StartTest(ServiceTest):
 
     def test_its_log_is_one_line_per_event_with_a_priority(self):
         self.manager()
+        self.assertEqual(self.service.log().splitlines()[0], "<5>         brivo[zeph] | Launching brivo [zeph]")
         for line in self.service.log().splitlines():
             self.assertRegex(line, r"^<[357]> *.{0,20} [|!] |^<[357]>")
 

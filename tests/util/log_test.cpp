@@ -3,11 +3,15 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdlib>
+
+#include "support/environment.h"
 #include "support/standard_error.h"
 
 namespace brivo {
 namespace {
 
+using test::ScopedVariable;
 using test::StandardErrorCapture;
 
 class LevelGuard {
@@ -71,6 +75,23 @@ TEST(LogTest, TheLineEndOfAFormatIsNotShown) {
   const StandardErrorCapture capture;
   OVLogError("t", "monitoring error: {}\n", "gone");
   EXPECT_EQ(capture.text(), "<3>                   t ! monitoring error: gone\n");
+}
+
+/// In a process of its own: what is silenced stays so.
+TEST(LogTest, TheLaunchMessageIsPrintedOnlyWhileTheDefaultLevelIsOn) {
+  const ScopedVariable debug("BRIVOD_DEBUG", std::nullopt);
+  const ScopedVariable journal("JOURNAL_STREAM", std::nullopt);
+  const auto launch = [] {
+    OVLog("brivo[zeph]", "{}", "Launching brivo [zeph]");
+    std::exit(EXIT_SUCCESS);
+  };
+  EXPECT_EXIT(launch(), testing::ExitedWithCode(EXIT_SUCCESS),
+              "brivo\\[zeph\\] \\| Launching brivo \\[zeph\\]");
+  const auto silenced = [&] {
+    UnifiedLog::silence();
+    launch();
+  };
+  EXPECT_EXIT(silenced(), testing::ExitedWithCode(EXIT_SUCCESS), "^$");
 }
 
 }  // namespace

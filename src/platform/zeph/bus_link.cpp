@@ -6,9 +6,9 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
-#include <list>
 
 #include "platform/zeph/bus_driver.h"
+#include "platform/zeph/bus_vtable.h"
 #include "platform/zeph/value_codec.h"
 
 namespace brivo::zeph {
@@ -19,43 +19,6 @@ constexpr int kMessagesPerTurn = 64;
 constexpr std::size_t kMostInBus = 32;
 
 std::string errorText(int code) { return std::strerror(code < 0 ? -code : code); }
-
-/// The protocol's members as sd-bus wants them; kept for the life of the program.
-class Vtables {
- public:
-  const sd_bus_vtable* of(const Protocol& protocol, sd_bus_message_handler_t onMethod) {
-    for (const Table& table : tables_) {
-      if (table.protocol == &protocol) return table.rows.data();
-    }
-    Table& table = tables_.emplace_back();
-    table.protocol = &protocol;
-    table.rows.push_back(SD_BUS_VTABLE_START(0));
-    for (const Member& member : protocol.members) table.rows.push_back(row(table, member, onMethod));
-    table.rows.push_back(SD_BUS_VTABLE_END);
-    return table.rows.data();
-  }
-
- private:
-  struct Table {
-    const Protocol* protocol = nullptr;
-    std::vector<sd_bus_vtable> rows;
-    std::list<std::string> strings;  // what the rows point to
-  };
-
-  static sd_bus_vtable row(Table& table, const Member& member, sd_bus_message_handler_t onMethod) {
-    const char* name = table.strings.emplace_back(member.dbusName()).c_str();
-    std::string& names = table.strings.emplace_back(member.names);
-    std::ranges::replace(names, ',', '\0');
-    if (member.kind == Member::Kind::signal) {
-      return SD_BUS_SIGNAL_WITH_NAMES(name, member.in, names.c_str(), 0);
-    }
-    sd_bus_vtable method = SD_BUS_METHOD(name, member.in, member.out, onMethod, SD_BUS_VTABLE_UNPRIVILEGED);
-    method.x.method.names = names.c_str();
-    return method;
-  }
-
-  std::list<Table> tables_;
-};
 
 /// One identity of the service's end for all connections of the process.
 sd_id128_t serverIdentity() {
@@ -154,15 +117,14 @@ int BusLink::serveObjects() {
   };
   int result = sd_bus_add_filter(bus_, nullptr, onAny, this);
   if (result < 0 || role_ == Role::client) return result;
-  static Vtables vtables;
   const auto onCall = [](sd_bus_message* message, void* self, sd_bus_error* error) {
     return static_cast<BusLink*>(self)->onMethod(message, error);
   };
   result = addBusDriver(bus_);
   if (result < 0) return result;
   const Protocol& protocol = exported_.protocol();
-  return sd_bus_add_object_vtable(bus_, nullptr, kObjectPath, protocol.interface,
-                                  vtables.of(protocol, onCall), this);
+  return sd_bus_add_object_vtable(bus_, nullptr, kObjectPath, protocol.interface, vtableOf(protocol, onCall),
+                                  this);
 }
 
 void BusLink::flush() { turn(); }

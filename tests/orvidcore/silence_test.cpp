@@ -98,5 +98,16 @@ TEST_F(SilentServiceTest, CallsOnAConnectionMadeToAStoppedServiceTimeOutToo) {
   expectTimeout([&] { return (*late)->devices(kShort); });
 }
 
+TEST_F(SilentServiceTest, EveryCallThatCouldNotEvenBeSentTimesOut) {
+  service.pause();
+  auto late = DeviceBrowser::connect(service.address(), kShort);
+  ASSERT_TRUE(late.ok()) << "the system accepts for it";
+  std::vector<Outcome<std::vector<DeviceInfo>>> outcomes(2000);
+  const auto begin = Clock::now();
+  for (auto& outcome : outcomes) (*late)->devicesAsync(outcome.callback(), kShort);
+  EXPECT_THAT(kindsOf(outcomes), testing::Each(ErrorKind::timedOut));
+  EXPECT_LT(Clock::now() - begin, kFarMore);
+}
+
 }  // namespace
 }  // namespace orvid::test

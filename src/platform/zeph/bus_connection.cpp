@@ -53,8 +53,7 @@ void BusConnection::invalidate() {
   loop_.post([self = self()] { self->end(End::invalidated, ""); });
 }
 
-// ------------------------------------------------------------------------------------------- any
-// thread
+// ------------------------------------------------------------------------------------------------ any thread
 
 void BusConnection::send(std::string_view selector, std::shared_ptr<const Arguments> arguments,
                          const ErrorHandler& onError) {
@@ -146,8 +145,7 @@ Reply BusConnection::replyFor(std::uint64_t token) {
   });
 }
 
-// ------------------------------------------------------------------------------------------- I/O
-// thread
+// ------------------------------------------------------------------------------------------------ I/O thread
 
 void BusConnection::start() {
   if (ended_ || link_ || !exported_ || !remote_) return;

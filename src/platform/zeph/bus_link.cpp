@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <limits>
 
 #include "platform/zeph/bus_driver.h"
 #include "platform/zeph/bus_vtable.h"
@@ -150,7 +151,7 @@ void BusLink::turn() {
   }
   if (result > 0 && reading_) sd_event_source_set_enabled(again_, SD_EVENT_ONESHOT);
   refill();
-  giveUpLateCalls();
+  if (role_ == Role::client && peerIsSilent()) giveUpLateCalls();
   rearm();
 }
 
@@ -177,12 +178,16 @@ void BusLink::settleSent() {
   if (messages > 0) owner_.left(messages, bytes);
 }
 
-void BusLink::refill() {
+bool BusLink::peerIsSilent() const {
   // Before the peer has authenticated, sd-bus does not know whether it takes descriptors.
-  if (ended_ || sd_bus_is_ready(bus_) <= 0) return;
+  return sd_bus_is_ready(bus_) <= 0 || queuedInBus() >= kMostInBus;
+}
+
+void BusLink::refill() {
+  if (ended_) return;
   settleSent();
   for (int i = 0; i < kMessagesPerTurn; ++i) {
-    if (queuedInBus() >= kMostInBus) return;  // continues when the socket takes more
+    if (peerIsSilent()) return;  // continues when the socket takes more
     if (toPut_.empty()) toPut_ = owner_.takeOutgoing(kMessagesPerTurn);
     if (toPut_.empty()) return;
     Outgoing next = std::move(toPut_.front());
@@ -196,8 +201,9 @@ void BusLink::refill() {
 }
 
 void BusLink::giveUpLateCalls() {
-  if (ended_ || role_ == Role::service) return;
-  std::deque<Outgoing> more = owner_.takeOutgoing(kMessagesPerTurn);
+  if (ended_) return;
+  // All of them: the timer goes by the first that is due.
+  std::deque<Outgoing> more = owner_.takeOutgoing(std::numeric_limits<std::size_t>::max());
   std::ranges::move(more, std::back_inserter(toPut_));
   const auto now = std::chrono::steady_clock::now();
   std::size_t messages = 0;
@@ -234,7 +240,7 @@ void BusLink::rearm() {
   }
   std::uint64_t due = UINT64_MAX;
   if (reading_) (void)sd_bus_get_timeout(bus_, &due);
-  if (role_ == Role::client) due = std::min(due, firstDeadline());
+  if (role_ == Role::client && peerIsSilent()) due = std::min(due, firstDeadline());
   if (due != UINT64_MAX) {
     sd_event_source_set_time(timer_, due);
     sd_event_source_set_enabled(timer_, SD_EVENT_ONESHOT);
@@ -243,8 +249,7 @@ void BusLink::rearm() {
   }
 }
 
-// ------------------------------------------------------------------------------------------------
-// sending
+// --------------------------------------------------------------------------------------------------- sending
 
 namespace {
 
@@ -332,8 +337,7 @@ int BusLink::put(OutgoingCall& call) {
   return 0;
 }
 
-// ----------------------------------------------------------------------------------------------
-// receiving
+// ------------------------------------------------------------------------------------------------- receiving
 
 void BusLink::onAnswer(PendingCall& call, sd_bus_message* message) {
   const auto answer = [&]() -> Answer {

@@ -72,6 +72,8 @@ class BusLink {
   void rearm();
   void end(const std::string& why);
 
+  /// Nothing can be put on the wire now: the peer has not authenticated yet, or does not read.
+  bool peerIsSilent() const;
   /// Gives up calls that were due before they could be put on the wire.
   void giveUpLateCalls();
   /// When the first of those is due, on the clock of sd_bus_get_timeout(3).

@@ -33,8 +33,7 @@ Dictionary dictionaryOf(const Error& error) {
 
 bool isLarge(const Data& data) { return data.size() >= kDescriptorThreshold; }
 
-// -------------------------------------------------------------------------------------------------
-// writing
+// --------------------------------------------------------------------------------------------------- writing
 
 class Writer {
  public:
@@ -221,8 +220,7 @@ std::string_view firstType(std::string_view signature) {
   return signature.substr(0, signature.front() == 'a' ? 2 : 1);
 }
 
-// -------------------------------------------------------------------------------------------------
-// reading
+// --------------------------------------------------------------------------------------------------- reading
 
 class Reader {
  public:

@@ -156,10 +156,7 @@ class DeviceBrowser::Implementation final : public brivo::zeph::ExportedObject,
     connection_->remoteObjectProxyWithErrorHandler(nullptr).call(
         selector, std::move(arguments), timeout,
         [handler = std::move(handler)](const brivo::zeph::Answer& answer) {
-          if (!answer.ok()) return handler(errorOf(answer.error()));
-          const auto* dictionary = answer->empty() ? nullptr : answer->front().get<Dictionary>();
-          handler(dictionary ? Result<Dictionary>(*dictionary)
-                             : Error{ErrorKind::malformed, 0, "the answer is no dictionary"});
+          handler(answer.ok() ? dictionaryOf(*answer) : errorOf(answer.error()));
         });
   }
 

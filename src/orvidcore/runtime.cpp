@@ -22,4 +22,10 @@ Error errorOf(const brivo::zeph::CallError& error) {
   return {ErrorKind::malformed, 0, error.name + ": " + error.text};
 }
 
+Result<Dictionary> dictionaryOf(const brivo::zeph::Arguments& answer) {
+  const auto* dictionary = answer.empty() ? nullptr : answer.front().get<Dictionary>();
+  if (!dictionary) return Error{ErrorKind::malformed, 0, "the answer is no dictionary"};
+  return *dictionary;
+}
+
 }  // namespace orvid

@@ -32,6 +32,9 @@ class Runtime {
 /// What a call that was not answered comes to.
 Error errorOf(const brivo::zeph::CallError& error);
 
+/// The dictionary that every answer with a value consists of.
+Result<Dictionary> dictionaryOf(const brivo::zeph::Arguments& answer);
+
 /// Starts an asynchronous call and waits for its outcome.
 template <class T, class Start>
 Result<T> blocking(Start start) {

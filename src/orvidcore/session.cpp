@@ -47,14 +47,6 @@ Error requestError(std::int64_t code) {
   return {ErrorKind::request, static_cast<std::int32_t>(code), text()};
 }
 
-/// The dictionary that every answer with a value consists of.
-Result<Dictionary> dictionaryOf(const Result<brivo::zeph::Arguments>& answer) {
-  if (!answer.ok()) return answer.error();
-  const auto* dictionary = answer->empty() ? nullptr : answer->front().get<Dictionary>();
-  if (!dictionary) return Error{ErrorKind::malformed, 0, "the answer is no dictionary"};
-  return *dictionary;
-}
-
 }  // namespace
 
 Result<std::shared_ptr<Session>> Session::open(std::shared_ptr<Runtime> runtime, const DeviceInfo& info,
@@ -114,7 +106,7 @@ void Session::request(std::string_view selector, std::uint32_t handle, Dictionar
                       Callback<Dictionary> handler) {
   call(selector, {std::uint64_t{handle}, std::move(options)}, timeout,
        [handler = std::move(handler)](const Result<brivo::zeph::Arguments>& answer) {
-         auto result = dictionaryOf(answer);
+         auto result = answer.ok() ? dictionaryOf(*answer) : answer.error();
          if (!result.ok()) return handler(std::move(result));
          const auto code = result->signedInteger(keys::kErrorCode).value_or(brivo::kResultSuccess);
          if (code != brivo::kResultSuccess) return handler(requestError(code));
@@ -125,7 +117,7 @@ void Session::request(std::string_view selector, std::uint32_t handle, Dictionar
 void Session::start(Timeout timeout, Callback<Dictionary> handler) {
   call(selectors::kRequestStartUsing, {}, timeout,
        [handler = std::move(handler)](const Result<brivo::zeph::Arguments>& answer) {
-         handler(dictionaryOf(answer));
+         handler(answer.ok() ? dictionaryOf(*answer) : answer.error());
        });
 }
 
@@ -207,6 +199,7 @@ void Session::ended() {
   catalogue_.close();
   // The last event finds the session alive, whoever has let go of it meanwhile.
   events_->post([self = shared_from_this()] {
+    self->lastEventTold_ = true;
     const auto events = self->told();
     if (events->onClosed) events->onClosed();
   });
@@ -217,9 +210,9 @@ void Session::waitForEvents() {
 }
 
 void Session::post(std::function<void(const DeviceEvents&)> tell) {
-  if (ended_) return;
   events_->post([weak = weak_from_this(), tell = std::move(tell)] {
-    if (const auto self = weak.lock()) tell(*self->told());
+    const auto self = weak.lock();
+    if (self && !self->lastEventTold_) tell(*self->told());
   });
 }
 

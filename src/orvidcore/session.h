@@ -75,6 +75,7 @@ class Session final : public brivo::zeph::ExportedObject, public std::enable_sha
   std::atomic<bool> answered_ = false;
   std::atomic<bool> enumerated_ = false;
   std::atomic<bool> ended_ = false;
+  bool lastEventTold_ = false;  // on the queue of events
 
   mutable brivo::Mutex mutex_;
   std::shared_ptr<const DeviceEvents> told_ BRIVO_GUARDED_BY(mutex_) = std::make_shared<const DeviceEvents>();

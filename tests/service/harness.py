@@ -164,7 +164,7 @@ def make_card(folder, files, root="DCIM"):
 class Connection:
     """One peer-to-peer connection. Signals are kept by a thread that runs a GLib loop."""
 
-    def __init__(self, address, interface, descriptors=True):
+    def __init__(self, address, interface):
         self.interface = interface
         self.signals = []
         self.closed = threading.Event()
@@ -176,7 +176,7 @@ class Connection:
         def run():
             self._context.push_thread_default()
             try:
-                self._connect(address, descriptors)
+                self._connect(address)
             except GLib.Error as error:
                 self._failure = error
             ready.set()
@@ -190,7 +190,7 @@ class Connection:
         if self._failure is not None:
             raise self._failure
 
-    def _connect(self, address, descriptors):
+    def _connect(self, address):
         flags = Gio.DBusConnectionFlags.AUTHENTICATION_CLIENT | Gio.DBusConnectionFlags.DELAY_MESSAGE_PROCESSING
         self.bus = Gio.DBusConnection.new_for_address_sync(address, flags, None, None)
         self.bus.connect("closed", lambda *_: self.closed.set())
@@ -259,13 +259,13 @@ class Manager(Connection):
 
 
 class Device(Connection):
-    def __init__(self, manager, path, start=True, **options):
+    def __init__(self, manager, path):
         context = manager.wait_for_device(path)
         self.handle = context["OVDeviceHandle"]
         self.opened = manager.open(self.handle)
         self._batches = []
-        super().__init__(self.opened["OVDeviceEndpoint"], KORVEL, **options)
-        self.properties = self.start_using() if start else None
+        super().__init__(self.opened["OVDeviceEndpoint"], KORVEL)
+        self.properties = self.start_using()
 
     def start_using(self):
         return self.call("requestStartUsingDeviceWithReply")
@@ -394,8 +394,8 @@ class ServiceTest(unittest.TestCase):
         self.addCleanup(manager.close)
         return manager
 
-    def device(self, manager, path, **options):
-        device = Device(manager, path, **options)
+    def device(self, manager, path):
+        device = Device(manager, path)
         self.addCleanup(device.close)
         return device
 

@@ -114,7 +114,7 @@ class ManyObjectsTest(ServiceTest):
         files = {f"{100 + i // 1000}ABCDE/IMG_{i % 1000:04}.JPG": b"x" for i in range(30_000)}
         self.path = self.folder_card("CARD", files)
 
-    def test_a_client_that_never_reads_is_ended_and_holds_up_nobody(self):
+    def test_a_client_that_never_reads_holds_up_nobody(self):
         manager = self.manager()
         device = self.device(manager, self.path)
         deaf = self.other_client()

@@ -3,8 +3,6 @@
 #include <sys/socket.h>
 
 #include <algorithm>
-#include <cstdio>
-#include <exception>
 #include <stdexcept>
 
 #include "bare_walk.h"
@@ -180,14 +178,8 @@ void compareSizes(const Options& options) {
 
 int main(int count, char** words) {
   using namespace brivo::bench;
-  const Options options = Options::fromCommandLine(count, words);
-  try {
-    printHeadings();
+  return runBenchmark(count, words, [](const Options& options) {
     compareWithBareWalk(options);
     compareSizes(options);
-  } catch (const std::exception& error) {
-    std::fprintf(stderr, "bench_catalogue: %s\n", error.what());
-    return 1;
-  }
-  return 0;
+  });
 }

@@ -1,7 +1,5 @@
 // SPDX-License-Identifier: MIT
 // What a request costs on the wire, and what idle clients cost.
-#include <cstdio>
-#include <exception>
 #include <stdexcept>
 
 #include "echo_process.h"
@@ -145,14 +143,8 @@ void compareIdleClients(const Options& options) {
 
 int main(int count, char** words) {
   using namespace brivo::bench;
-  const Options options = Options::fromCommandLine(count, words);
-  try {
-    printHeadings();
+  return runBenchmark(count, words, [](const Options& options) {
     compareRoundTrips(options);
     compareIdleClients(options);
-  } catch (const std::exception& error) {
-    std::fprintf(stderr, "bench_wire: %s\n", error.what());
-    return 1;
-  }
-  return 0;
+  });
 }

@@ -3,7 +3,10 @@
 
 #include <cstdio>
 #include <cstdlib>
+#include <exception>
 #include <string_view>
+
+#include "figures.h"
 
 namespace brivo::bench {
 
@@ -32,6 +35,18 @@ Options Options::fromCommandLine(int count, char** words) {
     }
   }
   return options;
+}
+
+int runBenchmark(int count, char** words, void (*measure)(const Options&)) {
+  const Options options = Options::fromCommandLine(count, words);
+  try {
+    printHeadings();
+    measure(options);
+  } catch (const std::exception& error) {
+    std::fprintf(stderr, "%s: %s\n", words[0], error.what());
+    return 1;
+  }
+  return 0;
 }
 
 }  // namespace brivo::bench

@@ -21,4 +21,8 @@ struct Options {
   }
 };
 
+/// The whole of a benchmark program: reads the command line, prints the headings and has `measure` print its
+/// figures. Gives what main() returns.
+int runBenchmark(int count, char** words, void (*measure)(const Options&));
+
 }  // namespace brivo::bench

@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <stdexcept>
 
 namespace brivo::test {
@@ -47,6 +48,8 @@ bool LoopMount::unmount() {
   if (mounted_ && ::umount(point_.c_str()) == 0) mounted_ = false;
   return !mounted_;
 }
+
+void LoopMount::yank() const { std::filesystem::resize_file(image_ / "image", 0); }
 
 HungMount::HungMount(const std::string& point)
     : point_(point), server_(::open("/dev/fuse", O_RDWR | O_CLOEXEC)) {

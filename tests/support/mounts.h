@@ -25,6 +25,8 @@ class LoopMount {
   const std::string& point() const { return point_; }
   /// An ordinary unmount: false when the file system is busy.
   bool unmount();
+  /// Takes the medium away from under the file system: what is not in memory cannot be read any more.
+  void yank() const;
 
  private:
   TemporaryFolder image_;

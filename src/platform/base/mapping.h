@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <span>
 
 namespace brivo {
@@ -19,9 +20,10 @@ class Mapping {
   static Mapping anonymous(std::size_t size);
   /// The first `size` bytes of `fd`, shared and writable. Empty on failure; errno tells why.
   static Mapping sharedWritable(int fd, std::size_t size);
-  /// The first `size` bytes of `fd`, shared and read-only. Only for files that cannot shrink:
-  /// reading past a file's end raises SIGBUS. Empty on failure; errno tells why.
-  static Mapping sharedReadable(int fd, std::size_t size);
+  /// `size` bytes of `fd` from `offset` on, a page border, shared and read-only. Reading past a file's
+  /// end raises SIGBUS: for files that cannot shrink, and for ProtectedMapping. Empty on failure;
+  /// errno tells why.
+  static Mapping sharedReadable(int fd, std::size_t size, std::uint64_t offset = 0);
 
   explicit operator bool() const { return !bytes_.empty(); }
   std::size_t size() const { return bytes_.size(); }
@@ -30,7 +32,7 @@ class Mapping {
 
  private:
   explicit Mapping(std::span<std::byte> bytes) : bytes_(bytes) {}
-  static Mapping map(std::size_t size, int protection, int flags, int fd);
+  static Mapping map(std::size_t size, int protection, int flags, int fd, std::uint64_t offset = 0);
 
   std::span<std::byte> bytes_;
 };

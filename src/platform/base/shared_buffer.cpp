@@ -1,0 +1,36 @@
+// SPDX-License-Identifier: MIT
+#include "platform/base/shared_buffer.h"
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace brivo {
+
+std::optional<SharedBuffer> SharedBuffer::create(const char* name, std::size_t size) {
+  UniqueFd fd(::memfd_create(name, MFD_CLOEXEC | MFD_ALLOW_SEALING));
+  if (!fd || ::ftruncate(fd.get(), static_cast<off_t>(size)) != 0 ||
+      ::fcntl(fd.get(), F_ADD_SEALS, F_SEAL_SHRINK) != 0) {
+    return std::nullopt;
+  }
+  return SharedBuffer(std::move(fd), size);
+}
+
+std::optional<SharedBuffer::Identity> SharedBuffer::identity() const {
+  struct stat status {};
+  if (::fstat(fd(), &status) != 0) return std::nullopt;
+  return Identity(status.st_dev, status.st_ino);
+}
+
+Mapping SharedBuffer::mapped(std::size_t size) const {
+  const int seals = ::fcntl(fd(), F_GET_SEALS);
+  struct stat status {};
+  if (seals < 0 || (seals & F_SEAL_SHRINK) == 0 || ::fstat(fd(), &status) != 0 || status.st_size < 0 ||
+      size_ > static_cast<std::uint64_t>(status.st_size) || size > size_) {
+    return {};
+  }
+  return Mapping::sharedWritable(fd(), size);
+}
+
+}  // namespace brivo

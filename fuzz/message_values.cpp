@@ -122,7 +122,7 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   Writer writer(made, input);
   while (input.remaining_bytes() > 0) writer.appendAny(0);
   if (sd_bus_message_seal(made, 1, 0) < 0 || sd_bus_message_rewind(made, 1) < 0) return 0;
-  const auto values = brivo::zeph::readArguments(made, false);
+  const auto values = brivo::zeph::readArguments(made, brivo::zeph::Descriptors::refused);
   if (!values) return 0;
   for (const brivo::Value& value : *values) {
     if (!value.get<brivo::Dictionary>()) continue;

@@ -8,6 +8,7 @@
 
 #include "platform/base/value.h"
 #include "platform/files/file_system.h"
+#include "platform/work/serial_queue.h"
 #include "platform/work/task.h"
 
 namespace brivo {
@@ -33,6 +34,8 @@ class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
   /// Sends serialised datasets to all clients as one content batch.
   virtual void flushNotifications(Array datasets) = 0;
 
+  /// A queue of its own for work on one of the device's files.
+  virtual std::shared_ptr<SerialQueue> makeSerialQueue() = 0;
   /// Queues an operation behind the requests of clients.
   virtual void addInitiatedOperation(Task operation) = 0;
   /// Runs a step of an enumeration on the device's share of the pool.

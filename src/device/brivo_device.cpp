@@ -63,6 +63,7 @@ BrivoDevice::~BrivoDevice() {
   OVLog("brivodevice", "{:>16} - {}", "dealloc path", lastPathComponent(url_.path()));
   deviceOperations_->cancelAllOperations();
   deviceOperations_->waitUntilAllOperationsAreFinished();
+  requests_.closeAllStreams();
   listener_->invalidate();
 }
 
@@ -154,7 +155,7 @@ void BrivoDevice::removeAllClients() {
 }
 
 void BrivoDevice::clientWentAway(std::int32_t pid) {
-  addInteractiveOperation([this, pid] { requests_.closeStreamsOf(pid); });
+  addInteractiveOperation([this, pid] { requests_.forgetClient(pid); });
 }
 
 void BrivoDevice::requestStartUsingDeviceWithReply(ResultHandler reply) {

@@ -104,6 +104,7 @@ class BrivoDevice final : public CameraDevice,
     index_.addCameraFolderToIndex(item);
   }
   void flushNotifications(Array datasets) override { notifications_.flushNotifications(std::move(datasets)); }
+  std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(services_.pool); }
   void addInitiatedOperation(Task operation) override;
   void enumerateConcurrently(Task step) override;
   void enumerateWhenClientsKeepUp(Task step) override;

@@ -115,6 +115,7 @@ bool DeviceService::shouldAcceptNewConnection(zeph::Listener&,
   connection->setExportedInterface(korvelInterface());
   connection->setRemoteObjectInterface(korvelInterface());
   connection->setExportedObject(device_.exportedObject());
+  connection->acceptBuffers();
   OVLog("clientManager", "{} clients", device_.numberOfClients());
   device_.clientManager().addClientWithConnection(connection);
   connection->resume();

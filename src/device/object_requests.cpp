@@ -2,8 +2,8 @@
 #include "device/object_requests.h"
 
 #include <algorithm>
+#include <set>
 
-#include "platform/base/memory_file.h"
 #include "protocol/keys.h"
 #include "protocol/result_codes.h"
 #include "util/log.h"
@@ -29,24 +29,15 @@ Dictionary withErrorCode(const Dictionary& options, std::int32_t code) {
 
 std::string nameOf(const std::shared_ptr<BrivoItem>& item) { return item ? item->name() : std::string(); }
 
-/// The first `count` bytes of a fresh buffer; empty for a read that failed.
+/// What a read gave, nothing when it failed.
 std::size_t usable(std::int64_t count) { return count > 0 ? static_cast<std::size_t>(count) : 0; }
 
-Data readIntoMemoryFile(const BrivoFile& file, std::uint64_t offset, std::uint64_t length) {
-  auto memory = MemoryFile::create("brivod-read", length);
-  if (!memory) return {};
-  const std::size_t count = usable(file.readStream(memory->bytes(), offset));
-  if (count == 0) return {};
-  return std::move(*memory).seal(count).value_or(Data());
-}
-
-Data readIntoBuffer(const BrivoFile& file, std::uint64_t offset, std::uint64_t length) {
-  std::vector<std::byte> buffer(length);
-  buffer.resize(usable(file.readStream(buffer, offset)));
-  return Data(std::move(buffer));
-}
-
 }  // namespace
+
+ObjectRequests::ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications)
+    : index_(index),
+      notifications_(notifications),
+      memory_(MemoryPool::create("brivod-read", kLongestRead, 2)) {}
 
 void ObjectRequests::requestMetadataForObjectHandle(std::uint64_t handle, const Dictionary& options,
                                                     const ResultHandler& reply) {
@@ -87,9 +78,10 @@ void ObjectRequests::requestReadDataFromObjectHandle(std::uint64_t handle, const
   const std::uint64_t size = item ? item->size() : 0;
   const bool open = options.boolean(keys::kReadBufferStreamOpen).value_or(false);
   const bool close = options.boolean(keys::kReadBufferStreamClose).value_or(false);
+  const Value* buffer = options.find(keys::kReadBuffer);
   if (open) {
     OVLog(nameOf(item), "OVReadBufferStreamOpen: {}", size);
-    if (file) openStream(file, client);
+    if (file) openStream(file, client, !buffer);
   }
   if (close) {
     OVLog(nameOf(item), "OVReadBufferStreamClose: {}", size);
@@ -102,23 +94,71 @@ void ObjectRequests::requestReadDataFromObjectHandle(std::uint64_t handle, const
     return reply(std::move(result));
   }
   const Range range = rangeOf(options, size);
-  const Data data = range.code == kResultSuccess && file ? read(*file, range) : Data();
-  Dictionary result = options;
-  result.set(keys::kReadData, data);
-  result.set(keys::kErrorCode, range.code);
+  Dictionary result = buffer ? readIntoBuffer(file.get(), range, options, *buffer, client)
+                             : readRange(file.get(), range, options);
+  const std::uint64_t count = buffer ? result.unsignedInteger(keys::kReadBufferCount).value_or(0)
+                                     : result.data(keys::kReadData)->size();
   reply(std::move(result));
-  if (data.empty()) return;
-  const std::uint64_t delivered = range.offset + data.size();
-  notifications_.sendNotificationDownloadProgressForObject(
-      file->objHandle(), delivered, static_cast<double>(delivered) / static_cast<double>(size) * 100.0);
+  if (count > 0) tellProgress(*file, range.offset + count);
 }
 
-Data ObjectRequests::read(BrivoFile& file, const Range& range) const {
+Dictionary ObjectRequests::readRange(BrivoFile* file, const Range& range, const Dictionary& options) {
+  Dictionary result = options;
+  result.set(keys::kReadData, file && range.code == kResultSuccess ? read(*file, range) : Data());
+  result.set(keys::kErrorCode, range.code);
+  return result;
+}
+
+Dictionary ObjectRequests::readIntoBuffer(BrivoFile* file, Range range, const Dictionary& options,
+                                          const Value& buffer, std::int32_t client) {
+  std::uint64_t count = 0;
+  if (file && range.code == kResultSuccess) {
+    const auto* lent = buffer.get<SharedBuffer>();
+    const auto memory = lent ? buffers_.memoryOf(*lent, client, range.length) : std::span<std::byte>();
+    if (memory.empty()) {
+      range.code = kResultBadRange;
+    } else if (file->openStream()) {
+      count = usable(file->readStream(memory, range.offset));
+      file->closeStream();
+    }
+  }
+  Dictionary result = options;
+  result.remove(keys::kReadBuffer);
+  result.set(keys::kReadData, Data());
+  result.set(keys::kReadBufferCount, count);
+  result.set(keys::kErrorCode, range.code);
+  return result;
+}
+
+Data ObjectRequests::read(BrivoFile& file, const Range& range) {
   if (!file.openStream()) return {};
-  Data data = range.length < kTravellingMemory ? readIntoBuffer(file, range.offset, range.length)
-                                               : readIntoMemoryFile(file, range.offset, range.length);
+  Data data;
+  if (OVBufferCache* cache = file.bufferCache()) {
+    std::uint64_t size = 0;
+    data = cache->consumeBufferAtOffset(range.offset, size).value_or(Data());
+    cache->setConsumedOffset(static_cast<std::int64_t>(range.offset));
+  } else {
+    data = readDirectly(file, range);
+  }
   file.closeStream();
   return data;
+}
+
+Data ObjectRequests::readDirectly(const BrivoFile& file, const Range& range) {
+  if (range.length < kTravellingMemory) {
+    std::vector<std::byte> buffer(range.length);
+    buffer.resize(usable(file.readStream(buffer, range.offset)));
+    return Data(std::move(buffer));
+  }
+  auto block = memory_->take();
+  if (!block) return {};
+  const std::size_t count = usable(file.readStream(block->bytes().first(range.length), range.offset));
+  return count > 0 ? std::move(*block).send(count) : Data();
+}
+
+void ObjectRequests::tellProgress(const BrivoFile& file, std::uint64_t delivered) const {
+  notifications_.sendNotificationDownloadProgressForObject(
+      file.objHandle(), delivered, static_cast<double>(delivered) / static_cast<double>(file.size()) * 100.0);
 }
 
 void ObjectRequests::requestDeleteObjectHandle(std::uint64_t handle, const Dictionary& options,
@@ -132,8 +172,18 @@ void ObjectRequests::requestDeleteObjectHandle(std::uint64_t handle, const Dicti
   reply(std::move(result));
 }
 
-void ObjectRequests::openStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client) {
-  if (file->openStream()) openStreams_.emplace(client, file);
+std::size_t ObjectRequests::cacheCount() const {
+  std::set<const BrivoFile*> cached;
+  for (const auto& [client, file] : openStreams_) {
+    if (file->bufferCache()) cached.insert(file.get());
+  }
+  return cached.size();
+}
+
+void ObjectRequests::openStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client, bool readAhead) {
+  if (!file->openStream()) return;
+  if (readAhead && (file->bufferCache() || cacheCount() < kMostCaches)) file->createBufferCache();
+  openStreams_.emplace(client, file);
 }
 
 /// A client closes what it opened itself, and not the streams of others.
@@ -143,12 +193,20 @@ void ObjectRequests::closeStream(const std::shared_ptr<BrivoFile>& file, std::in
   if (own == last) return;
   openStreams_.erase(own);
   file->closeStream();
+  file->destroyBufferCache();
 }
 
-void ObjectRequests::closeStreamsOf(std::int32_t client) {
-  const auto [first, last] = openStreams_.equal_range(client);
-  for (auto stream = first; stream != last; ++stream) stream->second->closeStream();
-  openStreams_.erase(first, last);
+void ObjectRequests::forgetClient(std::int32_t client) {
+  while (openStreams_.contains(client)) {
+    const std::shared_ptr<BrivoFile> file = openStreams_.find(client)->second;
+    closeStream(file, client);
+  }
+  buffers_.forget(client);
+  memory_->trim();
+}
+
+void ObjectRequests::closeAllStreams() {
+  while (!openStreams_.empty()) forgetClient(openStreams_.begin()->first);
 }
 
 }  // namespace brivo

@@ -10,6 +10,8 @@
 #include "content/media/brivo_file.h"
 #include "device/device_notifications.h"
 #include "device/object_index.h"
+#include "device/read_buffers.h"
+#include "platform/base/memory_pool.h"
 #include "platform/base/value.h"
 
 namespace brivo {
@@ -19,8 +21,7 @@ namespace brivo {
 class ObjectRequests {
  public:
   /// All must outlive this.
-  ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications)
-      : index_(index), notifications_(notifications) {}
+  ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications);
 
   void requestMetadataForObjectHandle(std::uint64_t handle, const Dictionary& options,
                                       const ResultHandler& reply);
@@ -28,15 +29,22 @@ class ObjectRequests {
                                            const ResultHandler& reply);
   /// Always refused: clients read ranges.
   static void requestDownloadObjectHandle(const Dictionary& options, const ResultHandler& reply);
-  /// A byte range, or, with the stream options, opens or closes the object's stream for the process `client`.
+  /// A byte range, in memory of the service or in the client's own, or, with the stream options, opens or
+  /// closes the object's stream for the process `client`.
   void requestReadDataFromObjectHandle(std::uint64_t handle, const Dictionary& options, std::int32_t client,
                                        const ResultHandler& reply);
   void requestDeleteObjectHandle(std::uint64_t handle, const Dictionary& options, const ResultHandler& reply);
 
-  /// Closes the streams that a client process left open, so that the volume can be unmounted.
-  void closeStreamsOf(std::int32_t client);
+  /// Closes the streams that a client process left open, so that the volume can be unmounted, and forgets the
+  /// memory it lent.
+  void forgetClient(std::int32_t client);
+  /// Closes all streams. No request may come after it.
+  void closeAllStreams();
 
  private:
+  /// Read-ahead caches of one device at a time, each of up to 12 MiB: further streams are read directly.
+  static constexpr std::size_t kMostCaches = 16;
+
   struct Range {
     std::uint64_t offset;
     std::uint64_t length;
@@ -45,12 +53,23 @@ class ObjectRequests {
   /// The range that the options ask for, and whether the object has it.
   static Range rangeOf(const Dictionary& options, std::uint64_t size);
 
-  void openStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client);
+  void openStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client, bool readAhead);
   void closeStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client);
-  Data read(BrivoFile& file, const Range& range) const;
+  std::size_t cacheCount() const;
+
+  Dictionary readRange(BrivoFile* file, const Range& range, const Dictionary& options);
+  /// The same into the memory that `buffer` stands for.
+  Dictionary readIntoBuffer(BrivoFile* file, Range range, const Dictionary& options, const Value& buffer,
+                            std::int32_t client);
+  Data read(BrivoFile& file, const Range& range);
+  Data readDirectly(const BrivoFile& file, const Range& range);
+  void tellProgress(const BrivoFile& file, std::uint64_t delivered) const;
 
   ObjectIndex& index_;
   const DeviceNotifications& notifications_;
+  /// What travels without having been read ahead; one piece may be with the client while the next is read.
+  const std::shared_ptr<MemoryPool> memory_;
+  ReadBuffers buffers_;
   /// Files by the process that has them open, once for each time.
   std::multimap<std::int32_t, std::shared_ptr<BrivoFile>> openStreams_;
 };

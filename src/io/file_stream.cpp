@@ -28,14 +28,20 @@ bool FileStream::close() {
 
 std::int64_t FileStream::read(FileSystem& files, std::span<std::byte> buffer, std::uint64_t offset,
                               std::uint64_t size) const {
-  Descriptor descriptor;
-  {
-    const UnfairLockGuard guard(lock_);
-    descriptor = descriptor_;
-  }
-  if (!descriptor || offset > size) return 0;
+  const Descriptor open = descriptor();
+  if (!open || offset > size) return 0;
   const std::uint64_t count = std::min<std::uint64_t>(buffer.size(), size - offset);
-  return files.read(descriptor->get(), buffer.first(count), offset);
+  return files.read(open->get(), buffer.first(count), offset);
+}
+
+std::unique_ptr<ProtectedMapping> FileStream::map(std::size_t length, std::uint64_t offset) const {
+  const Descriptor open = descriptor();
+  return open ? ProtectedMapping::map(open->get(), length, offset) : nullptr;
+}
+
+FileStream::Descriptor FileStream::descriptor() const {
+  const UnfairLockGuard guard(lock_);
+  return descriptor_;
 }
 
 std::uint32_t FileStream::streamCount() const {

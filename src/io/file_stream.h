@@ -9,6 +9,7 @@
 #include "platform/base/unfair_lock.h"
 #include "platform/base/unique_fd.h"
 #include "platform/files/file_system.h"
+#include "platform/files/protected_mapping.h"
 
 namespace brivo {
 
@@ -27,10 +28,15 @@ class FileStream {
   std::int64_t read(FileSystem& files, std::span<std::byte> buffer, std::uint64_t offset,
                     std::uint64_t size) const BRIVO_EXCLUDES(lock_);
 
+  /// Maps `length` bytes from `offset` on for reading; null when the stream is not open or cannot be mapped.
+  /// The mapping may outlive the stream.
+  std::unique_ptr<ProtectedMapping> map(std::size_t length, std::uint64_t offset) const BRIVO_EXCLUDES(lock_);
+
   std::uint32_t streamCount() const BRIVO_EXCLUDES(lock_);
 
  private:
   using Descriptor = std::shared_ptr<const UniqueFd>;
+  Descriptor descriptor() const BRIVO_EXCLUDES(lock_);
 
   mutable UnfairLock lock_;
   std::uint32_t count_ BRIVO_GUARDED_BY(lock_) = 0;

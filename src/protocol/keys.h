@@ -47,5 +47,7 @@ inline constexpr std::string_view kReadLength = "OVReadLength";
 inline constexpr std::string_view kReadBufferStreamOpen = "OVReadBufferStreamOpen";
 inline constexpr std::string_view kReadBufferStreamClose = "OVReadBufferStreamClose";
 inline constexpr std::string_view kReadData = "OVReadData";
+inline constexpr std::string_view kReadBuffer = "OVReadBuffer";
+inline constexpr std::string_view kReadBufferCount = "OVReadBufferCount";
 
 }  // namespace brivo::keys

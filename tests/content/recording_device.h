@@ -34,6 +34,7 @@ class RecordingDevice : public CameraDevice {
     const std::lock_guard lock(mutex);
     batches.push_back(std::move(datasets));
   }
+  std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(pool); }
   void addInitiatedOperation(Task operation) override { operation(); }
   /// Steps run in order on the test's thread, in run().
   void enumerateConcurrently(Task step) override { steps.push_back(std::move(step)); }
@@ -63,6 +64,7 @@ class RecordingDevice : public CameraDevice {
   bool locked = false;
   bool ejected = false;
   FileSystem* fileSystem = &systemFiles();
+  Pool pool;
   std::mutex mutex;
   std::vector<std::shared_ptr<BrivoFile>> files_;
   std::vector<std::shared_ptr<BrivoFolder>> folders;

@@ -21,6 +21,7 @@ class FakeConnection : public zeph::Connection {
   void setExportedObject(std::weak_ptr<zeph::ExportedObject>) override {}
   void setInterruptionHandler(Task handler) override { interruptionHandler = std::move(handler); }
   void setInvalidationHandler(Task handler) override { invalidationHandler = std::move(handler); }
+  void acceptBuffers() override { takesBuffers = true; }
   void resume() override { resumed = true; }
   void invalidate() override { ++invalidated; }
   bool isBacklogged() const override { return backlogged; }
@@ -35,6 +36,7 @@ class FakeConnection : public zeph::Connection {
 
   Task interruptionHandler;
   Task invalidationHandler;
+  bool takesBuffers = false;
   bool resumed = false;
   bool backlogged = false;
   int invalidated = 0;

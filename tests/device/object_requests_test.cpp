@@ -16,6 +16,7 @@ namespace brivo {
 namespace {
 
 constexpr std::int32_t kClient = 11;
+constexpr std::uint64_t kSlot = 2'097'152;
 
 class ObjectRequestsTest : public testing::Test {
  protected:
@@ -200,10 +201,68 @@ TEST_F(ObjectRequestsTest, OpenAndCloseAnswerWithoutTheOptions) {
   const Dictionary expected{{"OVReadData", Data()}, {"errCode", std::int32_t{0}}};
   EXPECT_EQ(read(file->objHandle(), {{"OVReadBufferStreamOpen", true}, {"mine", 1}}), expected);
   EXPECT_EQ(file->fileOpenCount(), 1u);
-  EXPECT_EQ(data(read(file->objHandle(), range(0, 3))), "012");
+  EXPECT_EQ(data(read(file->objHandle(), range(0, 10))), "0123456789");
   EXPECT_EQ(file->fileOpenCount(), 1u);
   EXPECT_EQ(read(file->objHandle(), {{"OVReadBufferStreamClose", true}}), expected);
   EXPECT_EQ(file->fileOpenCount(), 0u);
+}
+
+TEST_F(ObjectRequestsTest, PiecesOfAnOpenStreamComeReadAheadAsTheSlotsHoldThem) {
+  const auto file = makeFile(std::string(kSlot, 'a') + std::string(kSlot, 'b') + "c");
+  read(file->objHandle(), {{"OVReadBufferStreamOpen", true}});
+  const Dictionary first = read(file->objHandle(), range(0, 10));
+  EXPECT_EQ(data(first), std::string(kSlot, 'a')) << "a slot travels whole";
+  EXPECT_GE(first.data("OVReadData")->memfd(), 0);
+  EXPECT_EQ(data(read(file->objHandle(), range(kSlot, kSlot))), std::string(kSlot, 'b'));
+  EXPECT_EQ(data(read(file->objHandle(), range(2 * kSlot, 1))), "c");
+  EXPECT_EQ(code(read(file->objHandle(), range(2 * kSlot + 1, 1))), -21449);
+}
+
+TEST_F(ObjectRequestsTest, ASeekInAnOpenStreamIsAnEmptySuccessAndAfterTheCloseRangesAreReadDirectly) {
+  const auto file = makeFile(std::string(3 * kSlot, 'a'));
+  read(file->objHandle(), {{"OVReadBufferStreamOpen", true}});
+  const Dictionary sought = read(file->objHandle(), range(kSlot + 1, 10));
+  EXPECT_EQ(code(sought), 0);
+  EXPECT_EQ(data(sought), "");
+  EXPECT_EQ(data(read(file->objHandle(), range(0, kSlot))).size(), kSlot)
+      << "the order can be taken up again";
+  read(file->objHandle(), {{"OVReadBufferStreamClose", true}});
+  EXPECT_EQ(data(read(file->objHandle(), range(kSlot + 1, 10))), std::string(10, 'a'));
+}
+
+TEST_F(ObjectRequestsTest, OpeningAgainBeginsAtTheBeginningAgain) {
+  const auto file = makeFile(std::string(20 * kSlot, 'a'));
+  for (int i = 0; i < 2; ++i) {
+    read(file->objHandle(), {{"OVReadBufferStreamOpen", true}});
+    EXPECT_EQ(data(read(file->objHandle(), range(0, kSlot))).size(), kSlot);
+  }
+  EXPECT_EQ(file->fileOpenCount(), 2u);
+  read(file->objHandle(), {{"OVReadBufferStreamClose", true}});
+  EXPECT_EQ(file->fileOpenCount(), 1u);
+  EXPECT_EQ(file->bufferCache(), nullptr);
+}
+
+TEST_F(ObjectRequestsTest, MoreStreamsThanMayReadAheadAreReadDirectly) {
+  std::vector<std::shared_ptr<BrivoFile>> files;
+  for (int i = 0; i < 20; ++i) {
+    files.push_back(makeFile("0123456789", "IMG_" + std::to_string(1000 + i) + ".JPG"));
+    read(files.back()->objHandle(), {{"OVReadBufferStreamOpen", true}});
+  }
+  EXPECT_EQ(std::ranges::count_if(files, [](const auto& file) { return file->bufferCache() != nullptr; }),
+            16);
+  EXPECT_EQ(data(read(files.back()->objHandle(), range(3, 4))), "3456");
+  requests.forgetClient(kClient);
+  for (const auto& file : files) EXPECT_EQ(file->fileOpenCount(), 0u);
+}
+
+TEST_F(ObjectRequestsTest, AFileThatCannotBeOpenedAsAStreamAnswersWithNothing) {
+  const auto file = makeFile("0123456789");
+  std::filesystem::remove(card / "IMG_0001.JPG");
+  EXPECT_EQ(code(read(file->objHandle(), {{"OVReadBufferStreamOpen", true}})), 0);
+  const Dictionary result = read(file->objHandle(), range(0, 10));
+  EXPECT_EQ(code(result), 0);
+  EXPECT_EQ(data(result), "");
+  EXPECT_EQ(data(read(file->objHandle(), range(0, 10))), "") << "and again, without waiting for ever";
 }
 
 TEST_F(ObjectRequestsTest, BothFlagsOpenAndThenClose) {
@@ -235,9 +294,74 @@ TEST_F(ObjectRequestsTest, AClientThatGoesLeavesNoStreamOpen) {
   read(first->objHandle(), open, 11);
   read(second->objHandle(), open, 11);
   read(second->objHandle(), open, 12);
-  requests.closeStreamsOf(11);
+  requests.forgetClient(11);
   EXPECT_EQ(first->fileOpenCount(), 0u);
   EXPECT_EQ(second->fileOpenCount(), 1u);
+}
+
+TEST_F(ObjectRequestsTest, ALentBufferIsFilledAndTheAnswerLeavesItOut) {
+  const auto file = makeFile("0123456789");
+  const auto buffer = SharedBuffer::create("test", 8);
+  const Mapping memory = buffer->mapped(8);
+  Dictionary options = range(3, 4);
+  options.set("OVReadBuffer", *buffer);
+  options.set("mine", "kept");
+  const Dictionary expected{{"OVReadOffset", 3},    {"OVReadLength", 4},      {"mine", "kept"},
+                            {"OVReadData", Data()}, {"OVReadBufferCount", 4}, {"errCode", 0}};
+  const Dictionary result = read(file->objHandle(), options);
+  EXPECT_FALSE(result.contains("OVReadBuffer"));
+  EXPECT_EQ(describe(result), describe(expected));
+  EXPECT_EQ(Data::copyOf(memory.bytes()).text(), std::string_view("3456\0\0\0\0", 8));
+}
+
+TEST_F(ObjectRequestsTest, ABufferThatWillNotDoIsABadRangeAndNothingIsTouched) {
+  const auto file = makeFile("0123456789");
+  const auto small = SharedBuffer::create("test", 3);
+  const Mapping memory = small->mapped(3);
+  for (const Value& buffer : {Value(*small), Value(SharedBuffer(UniqueFd(), 100)), Value(7), Value("text")}) {
+    Dictionary options = range(0, 4);
+    options.set("OVReadBuffer", buffer);
+    const Dictionary result = read(file->objHandle(), options);
+    EXPECT_EQ(code(result), -21449);
+    EXPECT_EQ(result.unsignedInteger("OVReadBufferCount"), 0u);
+    EXPECT_FALSE(result.contains("OVReadBuffer"));
+  }
+  EXPECT_EQ(memory.bytes()[0], std::byte{0});
+}
+
+TEST_F(ObjectRequestsTest, RangesIntoALentBufferObeyTheSameLimits) {
+  const auto file = makeFile(std::string(4'194'310, 'x'));
+  Dictionary options = range(0, 4'194'305);
+  options.set("OVReadBuffer", *SharedBuffer::create("test", 8'000'000));
+  EXPECT_EQ(code(read(file->objHandle(), options)), -21446);
+  options.set("OVReadLength", 4'194'304);
+  EXPECT_EQ(read(file->objHandle(), options).unsignedInteger("OVReadBufferCount"), 4'194'304u);
+  options.set("OVReadOffset", 4'194'300);
+  options.set("OVReadLength", 11);
+  EXPECT_EQ(code(read(file->objHandle(), options)), -21449);
+}
+
+TEST_F(ObjectRequestsTest, AStreamThatIsOpenedWithABufferReadsNothingAhead) {
+  const auto file = makeFile(std::string(100, 'x'));
+  read(file->objHandle(),
+       {{"OVReadBufferStreamOpen", true}, {"OVReadBuffer", *SharedBuffer::create("test", 8)}});
+  EXPECT_EQ(file->fileOpenCount(), 1u);
+  EXPECT_EQ(file->bufferCache(), nullptr);
+  EXPECT_EQ(data(read(file->objHandle(), range(7, 5))), "xxxxx");
+}
+
+TEST_F(ObjectRequestsTest, ManyBuffersOfOneClientWorkInTurn) {
+  const auto file = makeFile("0123456789");
+  std::vector<SharedBuffer> buffers;
+  for (int i = 0; i < 40; ++i) buffers.push_back(*SharedBuffer::create("test", 10));
+  for (int round = 0; round < 2; ++round) {
+    for (const SharedBuffer& buffer : buffers) {
+      Dictionary options = range(0, 10);
+      options.set("OVReadBuffer", buffer);
+      EXPECT_EQ(read(file->objHandle(), options).unsignedInteger("OVReadBufferCount"), 10u);
+      EXPECT_EQ(Data::copyOf(buffer.mapped(10).bytes()).text(), "0123456789");
+    }
+  }
 }
 
 TEST_F(ObjectRequestsTest, ProgressIsToldToWhoeverWorksOnTheObject) {

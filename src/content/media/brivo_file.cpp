@@ -89,4 +89,20 @@ std::int64_t BrivoFile::readStream(std::span<std::byte> buffer, std::uint64_t of
   return stream_.read(device().files(), buffer, offset, size());
 }
 
+std::unique_ptr<ProtectedMapping> BrivoFile::readMap(std::size_t length, std::uint64_t offset) const {
+  return stream_.map(length, offset);
+}
+
+bool BrivoFile::closeMap(std::unique_ptr<ProtectedMapping>& map) const {
+  if (!map || device().beingEjected()) return false;
+  map.reset();
+  return true;
+}
+
+void BrivoFile::createBufferCache() {
+  destroyBufferCache();
+  bufferCache_ = OVBufferCache::initWithFile(*this, device().makeSerialQueue());
+  if (bufferCache_) bufferCache_->startReading();
+}
+
 }  // namespace brivo

@@ -9,6 +9,7 @@
 #include <string_view>
 
 #include "content/brivo_item.h"
+#include "io/buffer_cache.h"
 #include "io/file_stream.h"
 
 namespace brivo {
@@ -26,8 +27,9 @@ inline constexpr std::uint32_t kTypeAudio = fourCharacterCode("audo");
 inline constexpr std::uint32_t kTypeOther = fourCharacterCode("othe");
 
 /// A regular file on a volume. Its kind is decided once, from the extension of its name. The stream
-/// operations are *thread-safe*; the rest as in BrivoItem.
-class BrivoFile final : public BrivoItem {
+/// operations are *thread-safe*, those of the buffer cache belong to one thread at a time; the rest as in
+/// BrivoItem.
+class BrivoFile final : public BrivoItem, public ReadAheadSource {
  public:
   /// Makes the item of the file at `path`; null, with no handle taken, when the file system cannot tell its
   /// values. `prefetched` spares asking it.
@@ -38,6 +40,9 @@ class BrivoFile final : public BrivoItem {
   /// `name`, so the parent's must end with a separator. Null when there is no such file.
   static std::shared_ptr<BrivoFile> initForReadingOnlyWithName(std::string name, const BrivoItem& parent,
                                                                CameraDevice& device);
+
+  const std::string& name() const override { return BrivoItem::name(); }
+  std::uint64_t size() const override { return BrivoItem::size(); }
 
   bool hasThumbnail() const { return hasThumbnail_; }
   /// Keeps the dataset honest: "yes" turns a thumbnail size of 0 into 1, which marks a thumbnail whose size
@@ -85,8 +90,20 @@ class BrivoFile final : public BrivoItem {
   bool closeStream();
   /// Bytes read into `buffer` from `offset` on, not beyond the file's size; 0 when no stream is open, -1 when
   /// the medium failed.
-  std::int64_t readStream(std::span<std::byte> buffer, std::uint64_t offset) const;
+  std::int64_t readStream(std::span<std::byte> buffer, std::uint64_t offset) const override;
+  /// Maps `length` bytes from `offset` on for reading, zeros where the medium fails; null when no stream is
+  /// open or the file cannot be mapped.
+  std::unique_ptr<ProtectedMapping> readMap(std::size_t length, std::uint64_t offset) const;
+  /// Unmaps; false, with the mapping left alone, when there is none or the device is being ejected.
+  bool closeMap(std::unique_ptr<ProtectedMapping>& map) const;
   std::uint32_t fileOpenCount() const { return stream_.streamCount(); }
+
+  /// Begins to read ahead from the start of the file, in a new cache in place of one that is there; without
+  /// memory for it there is none.
+  void createBufferCache();
+  void destroyBufferCache() { bufferCache_.reset(); }
+  /// Null when there is none.
+  OVBufferCache* bufferCache() const { return bufferCache_.get(); }
 
  private:
   using BrivoItem::BrivoItem;
@@ -96,6 +113,7 @@ class BrivoFile final : public BrivoItem {
   std::string_view Tevo_;
   bool hasThumbnail_ = false;
   bool hasMetadata_ = false;
+  std::unique_ptr<OVBufferCache> bufferCache_;  // last: it reads from the stream
 };
 
 }  // namespace brivo

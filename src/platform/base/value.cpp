@@ -144,6 +144,9 @@ struct Describe {
   }
   std::string operator()(const std::string& value) const { return value; }
   std::string operator()(const Data& value) const { return fmt::format("<{} bytes>", value.size()); }
+  std::string operator()(const SharedBuffer& value) const {
+    return fmt::format("<buffer of {} bytes>", value.size());
+  }
   std::string operator()(const Url& value) const { return value.text(); }
   std::string operator()(const Endpoint& value) const { return value.address; }
   std::string operator()(const IndexSet& value) const {
@@ -173,6 +176,7 @@ Value::Class Value::valueClass() const {
     Class operator()(std::monostate) const { return Class::none; }
     Class operator()(const std::string&) const { return Class::string; }
     Class operator()(const Data&) const { return Class::data; }
+    Class operator()(const SharedBuffer&) const { return Class::buffer; }
     Class operator()(const Url&) const { return Class::url; }
     Class operator()(const Endpoint&) const { return Class::endpoint; }
     Class operator()(const IndexSet&) const { return Class::indexSet; }

@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "platform/base/data.h"
+#include "platform/base/shared_buffer.h"
 #include "platform/base/url.h"
 
 namespace brivo {
@@ -122,7 +123,7 @@ class Dictionary {
 class Value {
  public:
   /// The kinds that a receiver may restrict an argument to.
-  enum class Class { none, number, string, data, url, endpoint, indexSet, error, array, dictionary };
+  enum class Class { none, number, string, data, buffer, url, endpoint, indexSet, error, array, dictionary };
 
   Value() = default;
   Value(bool value) : storage_(value) {}
@@ -135,6 +136,7 @@ class Value {
   Value(std::string_view value) : storage_(std::string(value)) {}
   Value(std::string value) : storage_(std::move(value)) {}
   Value(Data value) : storage_(std::move(value)) {}
+  Value(SharedBuffer value) : storage_(std::move(value)) {}
   Value(Url value) : storage_(std::move(value)) {}
   Value(Endpoint value) : storage_(std::move(value)) {}
   Value(IndexSet value) : storage_(std::move(value)) {}
@@ -167,7 +169,7 @@ class Value {
 
  private:
   std::variant<std::monostate, bool, std::int32_t, std::uint32_t, std::int64_t, std::uint64_t, double,
-               std::string, Data, Url, Endpoint, IndexSet, Error, Array, Dictionary>
+               std::string, Data, SharedBuffer, Url, Endpoint, IndexSet, Error, Array, Dictionary>
       storage_;
 };
 

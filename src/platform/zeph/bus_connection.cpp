@@ -149,7 +149,7 @@ Reply BusConnection::replyFor(std::uint64_t token) {
 
 void BusConnection::start() {
   if (ended_ || link_ || !exported_ || !remote_) return;
-  link_ = BusLink::open(loop_.event(), std::move(socket_), role_, *exported_, *remote_, *this);
+  link_ = BusLink::open(loop_.event(), std::move(socket_), role_, takesBuffers_, *exported_, *remote_, *this);
   if (!link_) return end(End::interrupted, "cannot be served: no memory");
   link_->flush();
 }

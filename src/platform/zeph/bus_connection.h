@@ -51,6 +51,7 @@ class BusConnection final : public Connection, private LinkOwner {
   void setExportedObject(std::weak_ptr<ExportedObject> object) override;
   void setInterruptionHandler(Task handler) override;
   void setInvalidationHandler(Task handler) override;
+  void acceptBuffers() override { takesBuffers_ = true; }
   void resume() override;
   void invalidate() override;
   bool isBacklogged() const override;
@@ -97,6 +98,7 @@ class BusConnection final : public Connection, private LinkOwner {
   std::optional<Interface> exported_;
   std::optional<Interface> remote_;
   std::weak_ptr<ExportedObject> object_;
+  bool takesBuffers_ = false;
 
   std::atomic<std::size_t> waitingMessages_ = 0;
   std::atomic<std::size_t> waitingBytes_ = 0;

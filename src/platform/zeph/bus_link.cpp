@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "platform/zeph/bus_link.h"
 
+#include <sys/socket.h>
 #include <systemd/sd-id128.h>
 
 #include <algorithm>
@@ -10,6 +11,7 @@
 
 #include "platform/zeph/bus_driver.h"
 #include "platform/zeph/bus_vtable.h"
+#include "platform/zeph/pass_rights.h"
 #include "platform/zeph/value_codec.h"
 
 namespace brivo::zeph {
@@ -46,16 +48,21 @@ struct BusLink::PendingCall {
   sd_bus_slot* slot = nullptr;
 };
 
-std::unique_ptr<BusLink> BusLink::open(sd_event* event, UniqueFd socket, Role role, const Interface& exported,
-                                       const Interface& remote, LinkOwner& owner) {
-  std::unique_ptr<BusLink> link(new BusLink(event, role, exported, remote, owner));
+std::unique_ptr<BusLink> BusLink::open(sd_event* event, UniqueFd socket, Role role, bool takesBuffers,
+                                       const Interface& exported, const Interface& remote, LinkOwner& owner) {
+  std::unique_ptr<BusLink> link(new BusLink(event, role, takesBuffers, exported, remote, owner));
   if (link->start(std::move(socket)) < 0) return nullptr;
   return link;
 }
 
-BusLink::BusLink(sd_event* event, Role role, const Interface& exported, const Interface& remote,
-                 LinkOwner& owner)
-    : role_(role), exported_(exported), remote_(remote), owner_(owner), event_(sd_event_ref(event)) {}
+BusLink::BusLink(sd_event* event, Role role, bool takesBuffers, const Interface& exported,
+                 const Interface& remote, LinkOwner& owner)
+    : role_(role),
+      takesBuffers_(takesBuffers),
+      exported_(exported),
+      remote_(remote),
+      owner_(owner),
+      event_(sd_event_ref(event)) {}
 
 BusLink::~BusLink() {
   for (sd_event_source* source : {io_, timer_, again_}) sd_event_source_disable_unref(source);
@@ -77,6 +84,10 @@ BusLink::~BusLink() {
 int BusLink::start(UniqueFd socket) {
   int result = sd_bus_new(&bus_);
   if (result < 0) return result;
+  if (takesBuffers_) {
+    constexpr int yes = 1;
+    ::setsockopt(socket.get(), SOL_SOCKET, SO_PASSRIGHTS, &yes, sizeof yes);
+  }
   const int fd = socket.release();  // sd-bus closes it from here on
   result = sd_bus_set_fd(bus_, fd, fd);
   if (result < 0) {
@@ -347,7 +358,7 @@ void BusLink::onAnswer(PendingCall& call, sd_bus_message* message) {
       if (sd_bus_is_open(bus_) <= 0) return CallError{kErrorDisconnected, "The connection ended"};
       return CallError{error->name ? error->name : kErrorFailed, error->message ? error->message : ""};
     }
-    auto values = readArguments(message, true);
+    auto values = readArguments(message, Descriptors::asData);
     if (!values || !sd_bus_message_has_signature(message, call.member.out) ||
         (!values->empty() &&
          !remote_.admits(values->front(), call.member.selector, Interface::Origin::reply))) {
@@ -380,7 +391,7 @@ int BusLink::onMessage(sd_bus_message* message) {
     return 1;
   }
   if (member->kind != Member::Kind::signal || !sd_bus_message_is_signal(message, nullptr, nullptr)) return 0;
-  auto arguments = readArguments(message, true);
+  auto arguments = readArguments(message, Descriptors::asData);
   if (arguments && sd_bus_message_has_signature(message, member->in)) {
     receive(*member, std::move(*arguments), message);
   }
@@ -390,7 +401,7 @@ int BusLink::onMessage(sd_bus_message* message) {
 /// sd-bus has found the method and checked the signature.
 int BusLink::onMethod(sd_bus_message* message, sd_bus_error* error) {
   const Member* member = exported_.protocol().withDBusName(sd_bus_message_get_member(message));
-  auto arguments = readArguments(message, false);
+  auto arguments = readArguments(message, takesBuffers_ ? Descriptors::asBuffers : Descriptors::refused);
   if (!member || !arguments ||
       (!arguments->empty() &&
        !exported_.admits(arguments->front(), member->selector, Interface::Origin::argument))) {

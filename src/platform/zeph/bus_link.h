@@ -42,10 +42,10 @@ class BusLink {
  public:
   enum class Role { service, client };
 
-  /// Takes over the connected socket. Null, with the socket closed, when there is not enough
-  /// memory.
-  static std::unique_ptr<BusLink> open(sd_event* event, UniqueFd socket, Role role, const Interface& exported,
-                                       const Interface& remote, LinkOwner& owner);
+  /// Takes over the connected socket. The peer of a service may send descriptors when it `takesBuffers`.
+  /// Null, with the socket closed, when there is not enough memory.
+  static std::unique_ptr<BusLink> open(sd_event* event, UniqueFd socket, Role role, bool takesBuffers,
+                                       const Interface& exported, const Interface& remote, LinkOwner& owner);
   ~BusLink();
   BusLink(const BusLink&) = delete;
   BusLink& operator=(const BusLink&) = delete;
@@ -62,7 +62,8 @@ class BusLink {
     const Member* member;
   };
 
-  BusLink(sd_event* event, Role role, const Interface& exported, const Interface& remote, LinkOwner& owner);
+  BusLink(sd_event* event, Role role, bool takesBuffers, const Interface& exported, const Interface& remote,
+          LinkOwner& owner);
   int start(UniqueFd socket);
   int serveObjects();
 
@@ -94,6 +95,7 @@ class BusLink {
   void receive(const Member& member, Arguments arguments, sd_bus_message* message);
 
   const Role role_;
+  const bool takesBuffers_;
   const Interface& exported_;
   const Interface& remote_;
   LinkOwner& owner_;

@@ -12,10 +12,7 @@
 #include <utility>
 
 #include "platform/zeph/address.h"
-
-#ifndef SO_PASSRIGHTS
-#define SO_PASSRIGHTS 83
-#endif
+#include "platform/zeph/pass_rights.h"
 
 namespace brivo::zeph {
 

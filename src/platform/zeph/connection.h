@@ -114,6 +114,9 @@ class Connection : public std::enable_shared_from_this<Connection> {
   /// Runs after invalidate(), or when the peer left too much unread.
   virtual void setInvalidationHandler(Task handler) = 0;
 
+  /// Lets the peer lend memory: descriptors in its calls arrive as SharedBuffer. Without it such calls are
+  /// refused, and so, where the kernel can, is their sending.
+  virtual void acceptBuffers() = 0;
   /// Starts talking.
   virtual void resume() = 0;
   /// Ends the connection. What was sent before goes out as far as the socket takes it without

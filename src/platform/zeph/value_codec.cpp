@@ -156,6 +156,7 @@ class Writer {
     if (descriptors_ && isLarge(value)) return descriptorOf(value);
     return container('v', "ay", [&] { return bytes(value); });
   }
+  int variantOf(const SharedBuffer& value) const { return descriptorAndSize(value.fd(), value.size()); }
   int variantOf(const Array& value) const {
     switch (kindOf(value)) {
       case Array::Kind::strings:
@@ -189,10 +190,14 @@ class Writer {
       if (!sealed) return -errno;
       held = std::move(*sealed);
     }
+    return descriptorAndSize(held.memfd(), held.size());
+  }
+
+  int descriptorAndSize(int fd, std::uint64_t size) const {
     return container('v', "(ht)", [&] {
       return container('r', "ht", [&] {
-        const int result = basic('h', held.memfd());
-        return result < 0 ? result : basic('t', std::uint64_t{held.size()});
+        const int result = basic('h', fd);
+        return result < 0 ? result : basic('t', size);
       });
     });
   }
@@ -224,7 +229,7 @@ std::string_view firstType(std::string_view signature) {
 
 class Reader {
  public:
-  Reader(sd_bus_message* message, bool descriptors) : message_(message), descriptors_(descriptors) {}
+  Reader(sd_bus_message* message, Descriptors descriptors) : message_(message), descriptors_(descriptors) {}
 
   std::optional<Arguments> all() {
     Arguments values;
@@ -274,7 +279,7 @@ class Reader {
       case 'a':
         return array(contents, depth);
       case 'r':
-        return descriptors_ && std::strcmp(contents, "ht") == 0 ? memoryFile() : std::nullopt;
+        return std::strcmp(contents, "ht") == 0 ? descriptorAndSize() : std::nullopt;
       default:  // object paths, signatures, lone descriptors, other structures
         return std::nullopt;
     }
@@ -341,19 +346,22 @@ class Reader {
     return Value(std::move(dictionary));
   }
 
-  std::optional<Value> memoryFile() {
+  std::optional<Value> descriptorAndSize() {
+    if (descriptors_ == Descriptors::refused) return std::nullopt;
     return inside('r', "ht", [&]() -> std::optional<Value> {
       const auto fd = basic<int>('h');  // borrowed from the message
       const auto size = basic<std::uint64_t>('t');
       if (!fd || !size) return std::nullopt;
       UniqueFd own(::fcntl(*fd, F_DUPFD_CLOEXEC, 0));
-      auto data = own ? dataFromSealedMemfd(std::move(own), *size) : std::nullopt;
+      if (!own) return std::nullopt;
+      if (descriptors_ == Descriptors::asBuffers) return Value(SharedBuffer(std::move(own), *size));
+      auto data = dataFromSealedMemfd(std::move(own), *size);
       return data ? std::optional<Value>(std::move(*data)) : std::nullopt;
     });
   }
 
   sd_bus_message* message_;
-  bool descriptors_;
+  Descriptors descriptors_;
   std::size_t count_ = 0;
 };
 
@@ -389,7 +397,7 @@ int appendArguments(sd_bus_message* message, const char* signature, std::span<co
   return rest.empty() ? 0 : -EINVAL;
 }
 
-std::optional<Arguments> readArguments(sd_bus_message* message, bool descriptors) {
+std::optional<Arguments> readArguments(sd_bus_message* message, Descriptors descriptors) {
   return Reader(message, descriptors).all();
 }
 

@@ -155,6 +155,35 @@ TEST_F(BrivoFileTest, WhileTheDeviceIsEjectedNothingIsOpenedOrRead) {
   EXPECT_FALSE(file->closeStream());
 }
 
+TEST_F(BrivoFileTest, AFileIsMappedWhileItsStreamIsOpen) {
+  const auto file = make("IMG_0001.CR2", std::string(5'000, 'x'));
+  EXPECT_EQ(file->readMap(100, 0), nullptr);
+  file->openStream();
+  auto map = file->readMap(100, 4'500);
+  ASSERT_TRUE(map);
+  EXPECT_EQ(map->bytes()[99], std::byte{'x'});
+  device->ejected = true;
+  EXPECT_FALSE(file->closeMap(map));
+  EXPECT_TRUE(map);
+  device->ejected = false;
+  EXPECT_TRUE(file->closeMap(map));
+  EXPECT_FALSE(file->closeMap(map)) << "there is none any more";
+}
+
+TEST_F(BrivoFileTest, ABufferCacheReadsAheadInTheOpenStream) {
+  const auto file = make("IMG_0001.JPG", "0123456789");
+  file->openStream();
+  EXPECT_EQ(file->bufferCache(), nullptr);
+  for (int i = 0; i < 2; ++i) {
+    file->createBufferCache();
+    std::uint64_t size = 0;
+    EXPECT_EQ(file->bufferCache()->consumeBufferAtOffset(0, size)->text(), "0123456789");
+    EXPECT_EQ(size, 10u);
+  }
+  file->destroyBufferCache();
+  EXPECT_EQ(file->bufferCache(), nullptr);
+}
+
 TEST_F(BrivoFileTest, ACloseTooManyDoesNotUpsetTheNextReader) {
   const auto file = make("IMG_0001.JPG", "0123456789");
   EXPECT_FALSE(file->closeStream());

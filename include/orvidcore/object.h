@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <span>
 #include <string>
 
 #include "orvidcore/result.h"
@@ -35,6 +36,7 @@ struct ObjectInfo {
   std::uint32_t thumbHeight = 0;
 };
 
+class SavedFile;
 class Session;
 
 /// One object of a device. Cheap to copy; it keeps its device's session. *Thread-safe.*
@@ -44,6 +46,8 @@ class Object {
   static constexpr std::uint64_t kLongestRead = 4'194'304;
   /// Hears how many bytes of how many have been saved, and says whether to go on.
   using Progress = std::function<bool(std::uint64_t saved, std::uint64_t size)>;
+  /// Hears some bytes, which are gone when it returns, and says whether to go on.
+  using PieceHandler = std::function<bool(std::span<const std::byte> piece)>;
 
   Object(std::shared_ptr<Session> session, ObjectInfo info)
       : session_(std::move(session)), info_(std::move(info)) {}
@@ -65,8 +69,16 @@ class Object {
   void readAsync(std::uint64_t offset, std::uint64_t length, Callback<Data> done,
                  Timeout timeout = kDefaultTimeout) const;
 
+  /// Hands the bytes from `offset` to the object's end to `handler`, in order, as fast as the medium gives
+  /// them; the next ones are on their way meanwhile. Done as well when the handler said to stop; an error
+  /// when there were fewer bytes than the object's size. `timeout` holds for each piece.
+  Result<Done> stream(std::uint64_t offset, const PieceHandler& handler,
+                      Timeout timeout = kDefaultTimeout) const;
+
   /// Saves the whole object as `path`, which appears in one step when all bytes are on disk; an existing file
-  /// is replaced. `timeout` holds for each piece.
+  /// is replaced. When the card or the service goes in the middle of a large object, what was saved stays in
+  /// a hidden file beside `path`, and the next save of the same object as `path` goes on there. `timeout`
+  /// holds for each piece.
   Result<Done> save(const std::string& path, const Progress& progress = nullptr,
                     Timeout timeout = kDefaultTimeout) const;
   void saveAsync(std::string path, Callback<Done> done, Progress progress = nullptr,
@@ -77,6 +89,9 @@ class Object {
   void removeAsync(Callback<Done> done, Timeout timeout = kDefaultTimeout) const;
 
  private:
+  /// Saves into `file` what it does not have yet, and gives it its name.
+  Result<Done> fill(SavedFile& file, const Progress& progress, Timeout timeout) const;
+
   std::shared_ptr<Session> session_;
   ObjectInfo info_;
 };

@@ -1,36 +1,21 @@
 // SPDX-License-Identifier: MIT
 #include "orvidcore/object.h"
 
-#include <algorithm>
-
-#include "orvidcore/local_file.h"
+#include "orvidcore/piece_stream.h"
+#include "orvidcore/saved_file.h"
 #include "orvidcore/session.h"
-#include "protocol/keys.h"
+#include "protocol/result_codes.h"
 #include "protocol/selectors.h"
 
 namespace orvid {
 
-namespace keys = brivo::keys;
 namespace selectors = brivo::selectors;
 
 namespace {
 
-/// How much one piece of a whole file asks for.
-constexpr std::uint64_t kPieceSize = 2'097'152;
+/// How much of what an earlier try saved is compared with the card before it is gone on with, in bytes.
+constexpr std::uint64_t kCompared = 65'536;
 constexpr const char* kThumbnailSizeOption = "OVThumbnailMaxPixelSize";
-
-void requestData(Session& session, std::uint32_t handle, std::uint64_t offset, std::uint64_t length,
-                 Timeout timeout, Callback<Data> handler) {
-  Dictionary options;
-  options.set(keys::kReadOffset, offset);
-  options.set(keys::kReadLength, length);
-  session.request(selectors::kRequestReadData, handle, std::move(options), timeout,
-                  [handler = std::move(handler)](const Result<Dictionary>& result) {
-                    if (!result.ok()) return handler(result.error());
-                    const Data* data = result->data(keys::kReadData);
-                    handler(data ? *data : Data());
-                  });
-}
 
 Dictionary thumbnailOptions(std::uint32_t maximumPixelSize) {
   Dictionary options;
@@ -66,28 +51,51 @@ void Object::thumbnailAsync(std::uint32_t maximumPixelSize, Callback<Dictionary>
 
 Result<Data> Object::read(std::uint64_t offset, std::uint64_t length, Timeout timeout) const {
   return blocking<Data>([&](auto handler) {
-    requestData(*session_, info_.handle, offset, length, timeout, std::move(handler));
+    requestRange(*session_, info_.handle, offset, length, timeout, std::move(handler));
   });
 }
 
 void Object::readAsync(std::uint64_t offset, std::uint64_t length, Callback<Data> done,
                        Timeout timeout) const {
-  requestData(*session_, info_.handle, offset, length, timeout, session_->onEventQueue(std::move(done)));
+  requestRange(*session_, info_.handle, offset, length, timeout, session_->onEventQueue(std::move(done)));
+}
+
+Result<Done> Object::stream(std::uint64_t offset, const PieceHandler& handler, Timeout timeout) const {
+  if (offset > info_.size) return Error{ErrorKind::request, brivo::kResultBadRange, "beyond the end"};
+  return PieceStream(*session_, info_, timeout).run(offset, handler);
+}
+
+Result<Done> Object::fill(SavedFile& file, const Progress& progress, Timeout timeout) const {
+  if (file.size() > 0) {
+    const auto saved = file.tail(kCompared);
+    if (!saved.ok()) return saved.error();
+    const auto now = read(file.size() - saved->size(), saved->size(), timeout);
+    if (!now.ok()) return now.error();
+    if (!(*now == *saved)) {
+      if (auto emptied = file.startOver(); !emptied.ok()) return emptied;
+    }
+  }
+  Result<Done> result = Done();
+  const auto read = stream(
+      file.size(),
+      [&](std::span<const std::byte> piece) {
+        result = file.append(piece);
+        if (result.ok() && progress && !progress(file.size(), info_.size))
+          result = Error{ErrorKind::file, 0, "saving was stopped"};
+        return result.ok();
+      },
+      timeout);
+  if (!result.ok()) return result;
+  if (!read.ok()) return read;
+  return file.commit(info_.size);
 }
 
 Result<Done> Object::save(const std::string& path, const Progress& progress, Timeout timeout) const {
-  auto file = LocalFile::create(path);
+  auto file = SavedFile::open(path, info_);
   if (!file.ok()) return file.error();
-  for (std::uint64_t saved = 0; saved < info_.size;) {
-    const auto piece = read(saved, std::min(kPieceSize, info_.size - saved), timeout);
-    if (!piece.ok()) return piece.error();
-    if (piece->empty())
-      return Error{ErrorKind::disconnected, 0, "the medium gave no more bytes of " + info_.path};
-    if (const auto written = (*file)->append(piece->bytes()); !written.ok()) return written.error();
-    saved += piece->size();
-    if (progress && !progress(saved, info_.size)) return Error{ErrorKind::file, 0, "saving was stopped"};
-  }
-  return (*file)->commit();
+  auto result = fill(*file, progress, timeout);
+  if (!result.ok()) file->giveUp(result.error());
+  return result;
 }
 
 void Object::saveAsync(std::string path, Callback<Done> done, Progress progress, Timeout timeout) const {

@@ -7,6 +7,7 @@
 
 #include "orvidcore/catalogue.h"
 #include "orvidcore/device.h"
+#include "orvidcore/lent_buffers.h"
 #include "orvidcore/runtime.h"
 #include "platform/base/mutex.h"
 #include "platform/zeph/connection.h"
@@ -25,6 +26,7 @@ class Session final : public brivo::zeph::ExportedObject, public std::enable_sha
 
   const DeviceInfo& info() const { return info_; }
   Catalogue& catalogue() { return catalogue_; }
+  LentBuffers& lentBuffers() { return lentBuffers_; }
   void setEvents(DeviceEvents events) BRIVO_EXCLUDES(mutex_);
   void close() { connection_->invalidate(); }
   /// The device has gone: what is called from now on fails, and the last event is told. Once; then nothing.
@@ -72,6 +74,7 @@ class Session final : public brivo::zeph::ExportedObject, public std::enable_sha
   const std::shared_ptr<brivo::zeph::Connection> connection_;
   const std::shared_ptr<brivo::SerialQueue> events_;
   Catalogue catalogue_;
+  LentBuffers lentBuffers_;
   std::atomic<bool> answered_ = false;
   std::atomic<bool> enumerated_ = false;
   std::atomic<bool> ended_ = false;

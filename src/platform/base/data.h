@@ -29,6 +29,8 @@ class Data {
   std::span<const std::byte> bytes() const { return bytes_; }
   std::size_t size() const { return bytes_.size(); }
   bool empty() const { return bytes_.empty(); }
+  /// The first `count` bytes, or all when there are no more; shares the memory.
+  Data first(std::size_t count) const;
   /// The bytes as text, valid as long as this data.
   std::string_view text() const;
   /// The memory file behind the bytes, -1 when there is none; valid as long as this data.

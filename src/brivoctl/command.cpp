@@ -30,16 +30,29 @@ ExitCode fail(const std::string& text, ExitCode code) {
   return code;
 }
 
-ExitCode report(const orvid::Error& error) {
+std::string textOf(const orvid::Error& error) {
   switch (error.kind) {
     case orvid::ErrorKind::noService:
-      return fail("no service: " + error.text, kNoService);
+      return "no service: " + error.text;
     case orvid::ErrorKind::refused:
-      return fail(error.text + "; see brivoctl access --help", kRefused);
+      return error.text + "; see brivoctl access --help";
     default:
-      return fail(error.code == 0 ? error.text : fmt::format("{} (error {})", error.text, error.code));
+      return error.code == 0 ? error.text : fmt::format("{} (error {})", error.text, error.code);
   }
 }
+
+ExitCode exitCodeOf(const orvid::Error& error) {
+  switch (error.kind) {
+    case orvid::ErrorKind::noService:
+      return kNoService;
+    case orvid::ErrorKind::refused:
+      return kRefused;
+    default:
+      return kFailure;
+  }
+}
+
+ExitCode report(const orvid::Error& error) { return fail(textOf(error), exitCodeOf(error)); }
 
 CLI::App* addServiceCommand(CLI::App& app, CommonOptions& common, const char* name, const char* text) {
   CLI::App* command = app.add_subcommand(name, text);

@@ -22,6 +22,9 @@ struct CommonOptions {
   orvid::Timeout wait() const { return orvid::Timeout(static_cast<std::int64_t>(timeout * 1000)); }
 };
 
+/// An error as one line for people, and the exit code for it.
+std::string textOf(const orvid::Error& error);
+ExitCode exitCodeOf(const orvid::Error& error);
 /// Says what went wrong on standard error and gives the exit code for it.
 ExitCode report(const orvid::Error& error);
 ExitCode fail(const std::string& text, ExitCode code = kFailure);
@@ -32,6 +35,7 @@ CLI::App* addServiceCommand(CLI::App& app, CommonOptions& common, const char* na
 // Each adds its subcommands; a subcommand that runs leaves its exit code in `exitCode`.
 void addDeviceCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addObjectCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
+void addTransferCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addAccessCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 
 }  // namespace brivoctl

@@ -7,7 +7,8 @@
 int main(int argc, char** argv) {
   using namespace brivoctl;
   brivo::UnifiedLog::silence();  // what goes wrong here is said in this program's own words
-  CLI::App app("List, read and delete what is on camera cards, through the camera service.", "brivoctl");
+  CLI::App app("List, import, read and delete what is on camera cards, through the camera service.",
+               "brivoctl");
   app.require_subcommand(1);
   app.set_version_flag("--version", BRIVOD_VERSION);
   app.footer(
@@ -20,6 +21,7 @@ int main(int argc, char** argv) {
   ExitCode exitCode = kSuccess;
   addDeviceCommands(app, common, exitCode);
   addObjectCommands(app, common, exitCode);
+  addTransferCommands(app, common, exitCode);
   addAccessCommands(app, common, exitCode);
   try {
     app.parse(argc, argv);

@@ -71,47 +71,6 @@ ExitCode read(const CommonOptions& common, const ReadOptions& options) {
   return std::fflush(stdout) == 0 ? kSuccess : fail("cannot write to standard output");
 }
 
-struct GetOptions {
-  std::vector<std::string> arguments;
-  std::string folder = ".";
-  bool force = false;
-};
-
-ExitCode save(const CommonOptions& common, const orvid::Object& object, const GetOptions& options) {
-  const std::filesystem::path path = std::filesystem::path(options.folder) / object.info().name;
-  if (object.info().isFolder) return fail(shown(object.info().path) + " is a folder");
-  if (object.info().name.find('/') != std::string::npos || object.info().name.starts_with('.')) {
-    return fail("the name of " + shown(object.info().path) + " is no name for a file here");
-  }
-  if (!options.force && std::filesystem::exists(path)) {
-    return fail(shown(path.string()) + " is there already; --force replaces it");
-  }
-  const auto saved = object.save(path.string(), nullptr, common.wait());
-  if (!saved.ok()) return report(saved.error());
-  if (common.json) {
-    printJsonLine({{"handle", object.info().handle},
-                   {"path", object.info().path},
-                   {"file", path.string()},
-                   {"size", object.info().size}});
-  } else {
-    printLine(fmt::format("{}  {}", shown(path.string()), shownSize(object.info().size)));
-  }
-  return kSuccess;
-}
-
-ExitCode get(const CommonOptions& common, const GetOptions& options) {
-  const auto selected = openObjects(common, options.arguments);
-  if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
-  std::error_code error;
-  std::filesystem::create_directories(options.folder, error);
-  if (error) return fail(fmt::format("cannot make {}: {}", shown(options.folder), error.message()));
-  ExitCode worst = kSuccess;
-  for (const auto& object : std::get<0>(selected).objects) {
-    worst = std::max(worst, save(common, object, options));
-  }
-  return worst;
-}
-
 ExitCode remove(const CommonOptions& common, const std::vector<std::string>& arguments) {
   const auto selected = openObjects(common, arguments);
   if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
@@ -145,13 +104,6 @@ void addObjectCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode)
       ->check(CLI::NonNegativeNumber);
   reading->add_option("--length", readOptions->length, "How many bytes; to the end when left out");
   reading->callback([&common, &exitCode, readOptions] { exitCode = read(common, *readOptions); });
-
-  CLI::App* getting = add("get", "Save objects as files");
-  const auto getOptions = std::make_shared<GetOptions>();
-  getting->add_option("OBJECT", getOptions->arguments, "[DEVICE] OBJECT...")->required();
-  getting->add_option("-d,--directory", getOptions->folder, "Where to put them")->capture_default_str();
-  getting->add_flag("--force", getOptions->force, "Replace files that are there already");
-  getting->callback([&common, &exitCode, getOptions] { exitCode = get(common, *getOptions); });
 
   CLI::App* removing = add("rm", "Delete objects from the card");
   const auto objects = std::make_shared<std::vector<std::string>>();

@@ -46,6 +46,10 @@ void printJsonLine(const Json& line) {
   std::fflush(stdout);  // who reads JSON lines wants each when it comes
 }
 
+bool isFileName(const std::string& name) {
+  return !name.empty() && name.find('/') == std::string::npos && !name.starts_with('.');
+}
+
 std::string shown(const std::string& text) { return brivo::escapingControls(text); }
 
 std::string shownSize(std::uint64_t bytes) {

@@ -23,6 +23,8 @@ bool outputFailed();
 void printJson(const Json& document);
 void printJsonLine(const Json& line);
 
+/// A name from a card can be given to a file here: it leads nowhere else and is not hidden.
+bool isFileName(const std::string& name);
 /// Text from a card, safe for a terminal: control characters are shown escaped.
 std::string shown(const std::string& text);
 /// Such as "24.1 MB".

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include <gmock/gmock.h>
+#include <sys/resource.h>
 
+#include <csignal>
 #include <filesystem>
 
 #include "orvidcore/client_test.h"
@@ -165,6 +167,135 @@ TEST_F(SaveTest, ACardThatGoesDuringASaveEndsItAndNothingIsLeft) {
   });
   EXPECT_EQ(kindOf(saving), ErrorKind::disconnected);
   EXPECT_THAT(saved(), IsEmpty());
+}
+
+/// Larger than what is thrown away.
+constexpr std::size_t kFortyMegabytes = 40'000'000;
+
+/// A save that the end of the card cuts short, and the card put in again with the same file.
+class InterruptedSaveTest : public SaveTest {
+ protected:
+  Object interrupted() {
+    const Object object = cardOfOneTime(content);
+    DeviceEvents events;
+    events.onClosed = [&] { told.add("closed"); };
+    device->setEvents(std::move(events));
+    const auto saving = object.save(target, [&](std::uint64_t bytes, std::uint64_t) {
+      if (bytes < 20'000'000) return true;
+      if (fs::exists(service.card("CARD"))) service.removeCard("CARD");
+      return told.waitFor("closed");
+    });
+    EXPECT_EQ(kindOf(saving), ErrorKind::disconnected);
+    EXPECT_FALSE(fs::exists(target));
+    return object;
+  }
+  /// The object of a card that is put in with this content, of the same size and time as before.
+  Object again(std::string_view newContent) {
+    waitUntil([&] { return browser->devices()->empty(); });
+    device = nullptr;
+    return cardOfOneTime(newContent);
+  }
+  /// A card with one file, which is always of the same time.
+  Object cardOfOneTime(std::string_view newContent) {
+    const std::string path = service.addFile("CARD", "100ABCDE/IMG_0001.JPG", newContent);
+    fs::last_write_time(path, fs::file_time_type{});
+    return named(catalogueOfCard(), "IMG_0001.JPG");
+  }
+  /// How many bytes a save transfers.
+  std::uint64_t transferred(const Object& object) const {
+    std::uint64_t first = 0;
+    const auto saving = object.save(target, [&](std::uint64_t bytes, std::uint64_t) {
+      if (first == 0) first = bytes;
+      return true;
+    });
+    EXPECT_TRUE(saving.ok()) << saving.error().text;
+    return object.info().size - first;
+  }
+  const std::string content = pattern(kFortyMegabytes);
+};
+
+TEST_F(InterruptedSaveTest, ALargeSaveIsGoneOnWithWhenTheCardIsBack) {
+  interrupted();
+  ASSERT_EQ(saved().size(), 1u) << "what was saved stays, hidden";
+  EXPECT_TRUE(saved().front().starts_with("."));
+  EXPECT_LT(transferred(again(content)), 25'000'000u);
+  EXPECT_TRUE(readFile(target) == content);
+  EXPECT_THAT(saved(), ElementsAre("picture"));
+}
+
+TEST_F(InterruptedSaveTest, WhatIsThereOfAnotherContentIsNotGoneOnWith) {
+  interrupted();
+  const std::string other(kFortyMegabytes, 'x');
+  const Object object = again(other);
+  EXPECT_TRUE(object.save(target).ok());
+  EXPECT_TRUE(readFile(target) == other);
+}
+
+TEST_F(SaveTest, TheSameTargetTwiceAtOnceIsRefusedOnce) {
+  const Object object = onlyFile(pattern(kNineMegabytes));
+  std::optional<ErrorKind> second;
+  const auto first = object.save(target, [&](std::uint64_t, std::uint64_t) {
+    if (!second) second = kindOf(object.save(target));
+    return true;
+  });
+  EXPECT_TRUE(first.ok());
+  EXPECT_EQ(second, ErrorKind::file);
+  EXPECT_THAT(saved(), ElementsAre("picture"));
+}
+
+TEST_F(SaveTest, StreamingGivesEveryByteInOrderFromAnyOffsetOn) {
+  const std::string content = pattern(kNineMegabytes);
+  const Object object = onlyFile(content);
+  for (const std::uint64_t offset : {std::uint64_t{0}, std::uint64_t{1}, std::uint64_t{kNineMegabytes}}) {
+    std::string streamed;
+    const auto result = object.stream(offset, [&](std::span<const std::byte> piece) {
+      streamed.append(reinterpret_cast<const char*>(piece.data()), piece.size());
+      return true;
+    });
+    EXPECT_TRUE(result.ok());
+    EXPECT_TRUE(streamed == content.substr(offset)) << offset;
+  }
+  const auto beyond = object.stream(kNineMegabytes + 1, [](auto) { return true; });
+  EXPECT_EQ(codeOf(beyond), -21449);
+}
+
+TEST_F(SaveTest, AStreamThatIsToldToStopIsDoneAndAnotherWorks) {
+  const Object object = onlyFile(pattern(kNineMegabytes));
+  for (int i = 0; i < 3; ++i) {
+    int pieces = 0;
+    EXPECT_TRUE(object.stream(0, [&](auto) { return ++pieces < 2; }).ok());
+    EXPECT_EQ(pieces, 2);
+  }
+}
+
+TEST_F(SaveTest, AFileThatShrinksDuringASaveIsAnErrorAndNothingIsLeft) {
+  const Object object = onlyFile(pattern(kNineMegabytes));
+  const auto saving = object.save(target, [&](std::uint64_t, std::uint64_t) {
+    fs::resize_file(service.card("CARD") + "/DCIM/100ABCDE/IMG_0001.JPG", 5'000'001);
+    return true;
+  });
+  EXPECT_FALSE(saving.ok());
+  EXPECT_THAT(saved(), IsEmpty());
+}
+
+/// Without descriptors of its own for buffers, the client has the service read ahead.
+TEST_F(SaveTest, WithoutMemoryToLendTheServiceReadsAhead) {
+  const std::string content = pattern(kNineMegabytes);
+  const Object object = onlyFile(content);
+  rlimit limit{};
+  ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &limit), 0);
+  const rlimit small{1'000'000, limit.rlim_max};  // no memfd of the buffers' size
+  const auto ignored = std::signal(SIGXFSZ, SIG_IGN);
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &small), 0);
+  std::string streamed;
+  const auto result = object.stream(0, [&](std::span<const std::byte> piece) {
+    streamed.append(reinterpret_cast<const char*>(piece.data()), piece.size());
+    return true;
+  });
+  ::setrlimit(RLIMIT_FSIZE, &limit);
+  std::signal(SIGXFSZ, ignored);
+  EXPECT_TRUE(result.ok());
+  EXPECT_TRUE(streamed == content);
 }
 
 }  // namespace

@@ -8,6 +8,18 @@
 
 namespace brivo {
 
+namespace {
+
+/// What the kernel says of a memfd that cannot shrink; none for anything else. Only memfds have seals.
+std::optional<struct stat> sealedStatus(int fd) {
+  const int seals = ::fcntl(fd, F_GET_SEALS);
+  struct stat status {};
+  if (seals < 0 || (seals & F_SEAL_SHRINK) == 0 || ::fstat(fd, &status) != 0) return std::nullopt;
+  return status;
+}
+
+}  // namespace
+
 std::optional<SharedBuffer> SharedBuffer::create(const char* name, std::size_t size) {
   UniqueFd fd(::memfd_create(name, MFD_CLOEXEC | MFD_ALLOW_SEALING));
   if (!fd || ::ftruncate(fd.get(), static_cast<off_t>(size)) != 0 ||
@@ -18,18 +30,13 @@ std::optional<SharedBuffer> SharedBuffer::create(const char* name, std::size_t s
 }
 
 std::optional<SharedBuffer::Identity> SharedBuffer::identity() const {
-  struct stat status {};
-  if (::fstat(fd(), &status) != 0) return std::nullopt;
-  return Identity(status.st_dev, status.st_ino);
+  const auto status = sealedStatus(fd());
+  return status ? std::optional(Identity(status->st_dev, status->st_ino)) : std::nullopt;
 }
 
 Mapping SharedBuffer::mapped(std::size_t size) const {
-  const int seals = ::fcntl(fd(), F_GET_SEALS);
-  struct stat status {};
-  if (seals < 0 || (seals & F_SEAL_SHRINK) == 0 || ::fstat(fd(), &status) != 0 || status.st_size < 0 ||
-      size_ > static_cast<std::uint64_t>(status.st_size) || size > size_) {
-    return {};
-  }
+  const auto status = sealedStatus(fd());
+  if (!status || size_ > static_cast<std::uint64_t>(status->st_size) || size > size_) return {};
   return Mapping::sharedWritable(fd(), size);
 }
 

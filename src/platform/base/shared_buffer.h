@@ -31,7 +31,8 @@ class SharedBuffer {
   /// Borrowed.
   int fd() const { return fd_->get(); }
   std::uint64_t size() const { return size_; }
-  /// None for a descriptor that cannot be asked.
+  /// None unless the descriptor is a memfd that cannot shrink. Other files are not touched: asking one on a
+  /// file system that does not answer would wait.
   std::optional<Identity> identity() const;
   /// The first `size` bytes, readable and writable. Empty unless the descriptor is a memfd that cannot shrink
   /// and that holds what it is said to, which is `size` at least.

@@ -8,6 +8,7 @@ import socket
 import sys
 
 from gi.repository import GLib
+import reading
 from harness import Device, Manager, connect_raw, wait_until
 
 
@@ -57,6 +58,13 @@ class Client:
 
     def open_stream(self, handle):
         return self.device.read(handle, OVReadBufferStreamOpen=True)["errCode"]
+
+    def take_piece(self, handle, offset, length):
+        """Reads and looks at nothing: the error code and how many bytes there are."""
+        answer = reading.read(self.device, handle, offset, length)
+        size = len(answer)
+        answer.close()
+        return [answer.code, size]
 
     def connect_and_leave(self, times):
         """Connects to the manager's socket that often and hangs up without a word."""

@@ -167,6 +167,7 @@ void ObjectRequests::requestDeleteObjectHandle(std::uint64_t handle, const Dicti
   OVLog("delete", "Brivo - {}", nameOf(item));
   // An unknown handle is what a deleted object has.
   const bool deleted = !item || index_.deleteFile(item);
+  if (deleted) closeStreamsOn(item.get());
   Dictionary result = withErrorCode(options, deleted ? kResultSuccess : kResultDeleteFailed);
   OVLog("delete", "Brivo reply - {}", describe(result));
   reply(std::move(result));
@@ -194,6 +195,13 @@ void ObjectRequests::closeStream(const std::shared_ptr<BrivoFile>& file, std::in
   openStreams_.erase(own);
   file->closeStream();
   file->destroyBufferCache();
+}
+
+void ObjectRequests::closeStreamsOn(const BrivoItem* item) {
+  for (auto stream = openStreams_.begin(); stream != openStreams_.end();) {
+    const auto [client, file] = *stream++;
+    if (file.get() == item) closeStream(file, client);
+  }
 }
 
 void ObjectRequests::forgetClient(std::int32_t client) {

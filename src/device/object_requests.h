@@ -55,6 +55,8 @@ class ObjectRequests {
 
   void openStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client, bool readAhead);
   void closeStream(const std::shared_ptr<BrivoFile>& file, std::int32_t client);
+  /// Closes all streams of an object that is gone: no request reaches them any more.
+  void closeStreamsOn(const BrivoItem* item);
   std::size_t cacheCount() const;
 
   Dictionary readRange(BrivoFile* file, const Range& range, const Dictionary& options);

@@ -4,7 +4,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
-#include <semaphore>
 #include <utility>
 
 #include "util/log.h"
@@ -14,6 +13,7 @@ namespace brivo {
 std::unique_ptr<OVBufferCache> OVBufferCache::initWithFile(const ReadAheadSource& msFile,
                                                            std::shared_ptr<SerialQueue> opQueue) {
   std::unique_ptr<OVBufferCache> cache(new OVBufferCache(msFile, std::move(opQueue)));
+  const MutexLock lock(cache->mutex_);
   for (std::size_t slot = 0; slot < kSlotCount; ++slot) {
     if (!cache->mapSlot(slot)) {
       OVLogError(msFile.name(), "mmap failed for slot: {} cause: {}", slot, std::strerror(errno));
@@ -27,7 +27,6 @@ std::unique_ptr<OVBufferCache> OVBufferCache::initWithFile(const ReadAheadSource
 OVBufferCache::~OVBufferCache() {
   stopReading();
   opQueue_->runAndWait([] {});
-  opQueue_->runAndWait([] {});  // behind a step that was queued before reading stopped
 }
 
 bool OVBufferCache::mapSlot(std::size_t slot) {
@@ -36,18 +35,16 @@ bool OVBufferCache::mapSlot(std::size_t slot) {
 }
 
 void OVBufferCache::startReading() {
-  opQueue_->post([this] {
-    started_ = true;
-    reading_ = true;
-    readQueue();
-  });
+  const MutexLock lock(mutex_);
+  started_ = true;
+  reading_ = true;
+  readQueue();
 }
 
 void OVBufferCache::stopReading() {
-  opQueue_->post([this] {
-    reading_ = false;
-    serveTakes();
-  });
+  const MutexLock lock(mutex_);
+  reading_ = false;
+  changed_.notify_all();
 }
 
 // -------------------------------------------------------------------------------------------------- filling
@@ -56,80 +53,98 @@ void OVBufferCache::readQueue() {
   opQueue_->post([this] { readStep(); });
 }
 
-void OVBufferCache::readStep() {
-  if (!reading_ || availSlots_.empty() || bufDict_.contains(readOffset_)) return;
+std::optional<std::size_t> OVBufferCache::takeFreeSlot() {
+  if (!reading_ || availSlots_.empty() || bufDict_.contains(readOffset_)) return std::nullopt;
   const std::size_t slot = availSlots_.front();
   availSlots_.pop_front();
   OVLogVerbose(kLogTypeDetail, "--slot", "Slots Available: {}", availSlots_.size());
-  const std::int64_t count = msFile_.readStream(bufferCache_[slot]->bytes(), readOffset_);
+  return slot;
+}
+
+void OVBufferCache::readStep() {
+  std::optional<MemoryPool::Block> block;
+  std::optional<std::size_t> slot;
+  std::uint64_t offset = 0;
+  {
+    const MutexLock lock(mutex_);
+    slot = takeFreeSlot();
+    if (!slot) return;
+    block = std::exchange(bufferCache_[*slot], std::nullopt);
+    offset = readOffset_;
+    readUnderWay_ = true;
+  }
+  const std::int64_t count = msFile_.readStream(block->bytes(), offset);
   const std::size_t bytesRead = count > 0 ? static_cast<std::size_t>(count) : 0;  // a failed read ends it too
+  const MutexLock lock(mutex_);
+  readUnderWay_ = false;
   if (bytesRead == 0) reading_ = false;
-  bufDict_.emplace(readOffset_, Filled{slot, bytesRead});
+  bufferCache_[*slot] = std::move(block);
+  bufDict_.emplace(offset, Filled{*slot, bytesRead});
   readOffset_ += bytesRead;
-  serveTakes();
+  changed_.notify_all();
   if (reading_ && bufDict_.size() < kSlotCount) readQueue();
 }
 
-void OVBufferCache::free(std::map<std::uint64_t, Filled>::iterator filled) {
+void OVBufferCache::free(FilledSlots::iterator filled) {
   availSlots_.push_back(filled->second.slot);
   bufDict_.erase(filled);
   readQueue();
 }
 
+void OVBufferCache::recycle(std::uint64_t offset) {
+  const auto filled = bufDict_.find(offset);
+  if (filled == bufDict_.end()) return;
+  const std::size_t slot = filled->second.slot;
+  if (mapSlot(slot)) return free(filled);
+  OVLogError(msFile_.name(), "mmap failed for slot: {}", slot);
+}
+
 void OVBufferCache::resetBufferAtOffset(std::uint64_t offset) {
-  opQueue_->post([this, offset] {
-    const auto filled = bufDict_.find(offset);
-    if (filled == bufDict_.end()) return;
-    const std::size_t slot = filled->second.slot;
-    if (mapSlot(slot)) return free(filled);
-    OVLogError(msFile_.name(), "mmap failed for slot: {}", slot);
-  });
+  const MutexLock lock(mutex_);
+  recycle(offset);
 }
 
 // --------------------------------------------------------------------------------------------------- taking
 
-void OVBufferCache::whenFilled(const Take& take) {
-  std::binary_semaphore done(0);
-  opQueue_->post([&] {
-    takes_.emplace_back([&] {
-      take();
-      done.release();
-    });
-    serveTakes();
-  });
-  done.acquire();
+void OVBufferCache::setConsumedOffset(std::int64_t offset) {
+  const MutexLock lock(mutex_);
+  consumedOffset_ = offset;
 }
 
-void OVBufferCache::serveTakes() {
-  if (bufDict_.empty() && moreMayCome()) return;
-  for (const Take& take : std::exchange(takes_, {})) take();
+bool OVBufferCache::mayCome(std::uint64_t offset) const {
+  const bool isNext = offset == readOffset_ && (readUnderWay_ || (reading_ && !availSlots_.empty()));
+  return !bufDict_.contains(offset) && (isNext || (bufDict_.empty() && (!started_ || reading_)));
+}
+
+OVBufferCache::FilledSlots::iterator OVBufferCache::whenFilled(std::uint64_t offset) {
+  while (mayCome(offset)) changed_.wait(mutex_);
+  const auto filled = bufDict_.find(offset);
+  const bool isHere = filled != bufDict_.end() && bufferCache_[filled->second.slot];
+  return isHere ? filled : bufDict_.end();
 }
 
 std::optional<Data> OVBufferCache::consumeBufferAtOffset(std::uint64_t offset, std::uint64_t& sized) {
-  if (consumedOffset_ != -1) resetBufferAtOffset(static_cast<std::uint64_t>(consumedOffset_));
-  std::optional<Data> piece;
-  whenFilled([&] {
-    const auto filled = bufDict_.find(offset);
-    if (filled == bufDict_.end() || !bufferCache_[filled->second.slot]) return;
-    piece = std::move(*bufferCache_[filled->second.slot]).send(filled->second.bytesRead);
-    bufferCache_[filled->second.slot].reset();
-    sized = piece->size();
-  });
+  const MutexLock lock(mutex_);
+  if (consumedOffset_ != -1) recycle(static_cast<std::uint64_t>(consumedOffset_));
+  const auto filled = whenFilled(offset);
+  if (filled == bufDict_.end()) return std::nullopt;
+  const auto [slot, bytesRead] = filled->second;
+  Data piece = (*std::exchange(bufferCache_[slot], std::nullopt)).send(bytesRead);
+  sized = piece.size();
   return piece;
 }
 
 void OVBufferCache::dequeueBufferAtOffset(std::uint64_t offset, std::uint64_t& sized,
                                           std::span<std::byte> buf) {
-  whenFilled([&] {
-    const auto filled = bufDict_.find(offset);
-    if (filled == bufDict_.end() || !bufferCache_[filled->second.slot]) return;
-    const auto [slot, bytesRead] = filled->second;
-    OVLogVerbose(kLogTypeDetail, "++deq", "Dequeing Slot: {}", slot);
-    sized = bytesRead;
-    std::ranges::copy(bufferCache_[slot]->bytes().first(std::min(bytesRead, buf.size())), buf.begin());
-    free(filled);
-    OVLogVerbose(kLogTypeDetail, "++slot", "Slots Available: {}", availSlots_.size());
-  });
+  const MutexLock lock(mutex_);
+  const auto filled = whenFilled(offset);
+  if (filled == bufDict_.end()) return;
+  const auto [slot, bytesRead] = filled->second;
+  OVLogVerbose(kLogTypeDetail, "++deq", "Dequeing Slot: {}", slot);
+  sized = bytesRead;
+  std::ranges::copy(bufferCache_[slot]->bytes().first(std::min(bytesRead, buf.size())), buf.begin());
+  free(filled);
+  OVLogVerbose(kLogTypeDetail, "++slot", "Slots Available: {}", availSlots_.size());
 }
 
 }  // namespace brivo

@@ -2,18 +2,18 @@
 #pragma once
 
 #include <array>
+#include <condition_variable>
 #include <cstdint>
 #include <deque>
-#include <functional>
 #include <map>
 #include <memory>
 #include <optional>
 #include <span>
 #include <string>
-#include <vector>
 
 #include "platform/base/data.h"
 #include "platform/base/memory_pool.h"
+#include "platform/base/mutex.h"
 #include "platform/work/serial_queue.h"
 
 namespace brivo {
@@ -31,8 +31,8 @@ class ReadAheadSource {
 
 /// Reads ahead of a client that takes a file piece by piece: fills up to five slots of 2 MiB from the
 /// beginning of the file on, goes on whenever a slot is taken, and ends with an empty piece where the file
-/// gives no more. What is read travels to the client in the slot's own memory. *Thread-safe*; its own queue
-/// runs every change.
+/// gives no more. What is read travels to the client in the slot's own memory. *Thread-safe*; it reads on its
+/// own queue, and what has been read can be taken meanwhile.
 ///
 ///     startReading(), then for each piece: consumeBufferAtOffset(), setConsumedOffset()
 class OVBufferCache {
@@ -50,58 +50,64 @@ class OVBufferCache {
   OVBufferCache& operator=(const OVBufferCache&) = delete;
 
   /// Begins to read ahead. Does not wait.
-  void startReading();
+  void startReading() BRIVO_EXCLUDES(mutex_);
   /// Ends reading ahead; what was read stays. Does not wait.
-  void stopReading();
+  void stopReading() BRIVO_EXCLUDES(mutex_);
 
   /// The piece that begins at `offset`, in the memory that it was read into, with its size in `sized`; none,
-  /// with `sized` unchanged, when no filled slot begins there. Waits, without limit, while no slot is filled
-  /// and one may still come. The piece stays the cache's until the next call, if setConsumedOffset() names
-  /// it.
-  std::optional<Data> consumeBufferAtOffset(std::uint64_t offset, std::uint64_t& sized);
+  /// with `sized` unchanged, when no filled slot begins there. Waits, without limit, while this piece is
+  /// being read, and while no slot is filled and one may still come. The slot stays taken until the next
+  /// call, if setConsumedOffset() names it.
+  std::optional<Data> consumeBufferAtOffset(std::uint64_t offset, std::uint64_t& sized)
+      BRIVO_EXCLUDES(mutex_);
   /// Which piece was handed out last; the next consumeBufferAtOffset() has its slot filled anew.
-  void setConsumedOffset(std::int64_t offset) { consumedOffset_ = offset; }
+  void setConsumedOffset(std::int64_t offset) BRIVO_EXCLUDES(mutex_);
   /// Gives the slot of the piece at `offset` other memory and has it filled. Does not wait.
-  void resetBufferAtOffset(std::uint64_t offset);
+  void resetBufferAtOffset(std::uint64_t offset) BRIVO_EXCLUDES(mutex_);
   /// Copies the piece that begins at `offset` into `buf`, as much as that takes, sets `sized` to the piece's
   /// size and has its slot filled anew; without such a piece nothing changes. Waits like
   /// consumeBufferAtOffset().
-  void dequeueBufferAtOffset(std::uint64_t offset, std::uint64_t& sized, std::span<std::byte> buf);
+  void dequeueBufferAtOffset(std::uint64_t offset, std::uint64_t& sized, std::span<std::byte> buf)
+      BRIVO_EXCLUDES(mutex_);
 
  private:
   struct Filled {
     std::size_t slot;
     std::size_t bytesRead;
   };
-  using Take = std::function<void()>;
+  using FilledSlots = std::map<std::uint64_t, Filled>;  // by the offset at which a slot's bytes begin
 
   OVBufferCache(const ReadAheadSource& msFile, std::shared_ptr<SerialQueue> opQueue)
       : msFile_(msFile), opQueue_(std::move(opQueue)) {}
-  bool mapSlot(std::size_t slot);
 
-  // On the queue.
+  bool mapSlot(std::size_t slot) BRIVO_REQUIRES(mutex_);
+  void recycle(std::uint64_t offset) BRIVO_REQUIRES(mutex_);
+  void free(FilledSlots::iterator filled) BRIVO_REQUIRES(mutex_);
   void readQueue();
-  void readStep();
-  void free(std::map<std::uint64_t, Filled>::iterator filled);
-  void serveTakes();
-  bool moreMayCome() const { return !started_ || reading_; }
-  /// Runs `take` on the queue as soon as a slot is filled or none will be, and returns then.
-  void whenFilled(const Take& take);
+  /// On the queue.
+  void readStep() BRIVO_EXCLUDES(mutex_);
+  std::optional<std::size_t> takeFreeSlot() BRIVO_REQUIRES(mutex_);
+  /// Whether the piece at `offset`, or any, may still come and has to be waited for.
+  bool mayCome(std::uint64_t offset) const BRIVO_REQUIRES(mutex_);
+  /// The filled slot that begins at `offset`, once it is known whether there is one; else bufDict_.end().
+  FilledSlots::iterator whenFilled(std::uint64_t offset) BRIVO_REQUIRES(mutex_);
 
   const ReadAheadSource& msFile_;
   const std::shared_ptr<SerialQueue> opQueue_;
   /// The slots, what a reply may hold of them, and one more that a client may still be looking at.
   const std::shared_ptr<MemoryPool> memory_ = MemoryPool::create("brivod-slot", kSlotSize, 2);
-  std::int64_t consumedOffset_ = -1;  // the taking thread's
 
-  // On the queue.
-  std::array<std::optional<MemoryPool::Block>, kSlotCount> bufferCache_;
-  std::deque<std::size_t> availSlots_;
-  std::map<std::uint64_t, Filled> bufDict_;  // by the offset at which a slot's bytes begin
-  std::uint64_t readOffset_ = 0;
-  bool started_ = false;
-  bool reading_ = false;
-  std::vector<Take> takes_;  // waiting for a filled slot
+  Mutex mutex_;
+  std::condition_variable_any changed_;
+  /// Empty: the memory is with a reply, or with the read under way.
+  std::array<std::optional<MemoryPool::Block>, kSlotCount> bufferCache_ BRIVO_GUARDED_BY(mutex_);
+  std::deque<std::size_t> availSlots_ BRIVO_GUARDED_BY(mutex_);
+  FilledSlots bufDict_ BRIVO_GUARDED_BY(mutex_);
+  std::uint64_t readOffset_ BRIVO_GUARDED_BY(mutex_) = 0;
+  std::int64_t consumedOffset_ BRIVO_GUARDED_BY(mutex_) = -1;
+  bool started_ BRIVO_GUARDED_BY(mutex_) = false;
+  bool reading_ BRIVO_GUARDED_BY(mutex_) = false;
+  bool readUnderWay_ BRIVO_GUARDED_BY(mutex_) = false;
 };
 
 }  // namespace brivo

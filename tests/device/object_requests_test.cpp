@@ -364,6 +364,20 @@ TEST_F(ObjectRequestsTest, ManyBuffersOfOneClientWorkInTurn) {
   }
 }
 
+TEST_F(ObjectRequestsTest, DeletingAFileClosesItsStreams) {
+  const auto file = makeFile("0123456789");
+  const auto other = makeFile("x", "IMG_0002.JPG");
+  const Dictionary open{{"OVReadBufferStreamOpen", true}};
+  read(file->objHandle(), open, 11);
+  read(file->objHandle(), open, 12);
+  read(file->objHandle(), open, 12);
+  read(other->objHandle(), open, 12);
+  answer([&](const auto& reply) { requests.requestDeleteObjectHandle(file->objHandle(), {}, reply); });
+  EXPECT_EQ(file->fileOpenCount(), 0u);
+  EXPECT_EQ(file->bufferCache(), nullptr);
+  EXPECT_EQ(other->fileOpenCount(), 1u);
+}
+
 TEST_F(ObjectRequestsTest, ProgressIsToldToWhoeverWorksOnTheObject) {
   const auto file = makeFile("0123456789");
   const auto connection = std::make_shared<FakeConnection>(kClient);

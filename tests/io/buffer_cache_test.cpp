@@ -3,7 +3,6 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 
 #include <atomic>
 #include <cstring>
@@ -11,6 +10,7 @@
 #include <mutex>
 
 #include "platform/work/pool.h"
+#include "support/file_size_limit.h"
 #include "support/standard_error.h"
 #include "support/wait.h"
 
@@ -28,7 +28,7 @@ class MadeUpFile : public ReadAheadSource {
   std::uint64_t size() const override { return size_; }
   std::int64_t readStream(std::span<std::byte> buffer, std::uint64_t offset) const override {
     ++reads;
-    const std::lock_guard wait(gate);
+    if (offset >= stallsAt) const std::lock_guard wait(gate);
     if (offset >= failsAt) return -1;
     const std::uint64_t end = std::min({size_, endsAt, failsAt});
     const std::uint64_t count = offset >= end ? 0 : std::min<std::uint64_t>(buffer.size(), end - offset);
@@ -40,6 +40,7 @@ class MadeUpFile : public ReadAheadSource {
 
   std::uint64_t endsAt = UINT64_MAX;   ///< the file on the medium is shorter than its size
   std::uint64_t failsAt = UINT64_MAX;  ///< reads from here on fail, also the first
+  std::uint64_t stallsAt = 0;          ///< reads from here on wait for the gate
   mutable std::mutex gate;             ///< held: the medium does not answer
   mutable std::atomic<int> reads = 0;
 
@@ -176,6 +177,31 @@ TEST_F(BufferCacheTest, ATakeWaitsForASlowMedium) {
   EXPECT_EQ(taken.get(), kSlot);
 }
 
+TEST_F(BufferCacheTest, WhatHasBeenReadIsTakenWhileTheNextPieceIsBeingRead) {
+  MadeUpFile file(10 * kSlot);
+  file.stallsAt = 3 * kSlot;
+  file.gate.lock();
+  const auto cache = started(file);
+  for (std::uint64_t slot = 0; slot < 3; ++slot) EXPECT_EQ(take(*cache, slot * kSlot), kSlot);
+  auto next = std::async(std::launch::async, [&] { return take(*cache, 3 * kSlot); });
+  EXPECT_EQ(next.wait_for(std::chrono::milliseconds(50)), std::future_status::timeout);
+  file.gate.unlock();
+  EXPECT_EQ(next.get(), kSlot);
+}
+
+TEST_F(BufferCacheTest, APieceThatWasPassedOverDoesNotKeepLaterOnesFromBeingWaitedFor) {
+  MadeUpFile file(10 * kSlot);
+  file.stallsAt = kSlot;
+  file.gate.lock();
+  const auto cache = started(file);
+  auto second = std::async(std::launch::async, [&] { return take(*cache, kSlot); });
+  ASSERT_TRUE(test::waitUntil([&] { return file.reads == 2; }));
+  EXPECT_EQ(second.wait_for(std::chrono::milliseconds(50)), std::future_status::timeout);
+  file.gate.unlock();
+  EXPECT_EQ(second.get(), kSlot);
+  for (std::uint64_t slot = 2; slot < 10; ++slot) EXPECT_EQ(take(*cache, slot * kSlot), kSlot);
+}
+
 TEST_F(BufferCacheTest, ATakeBeforeReadingHasBegunWaitsForTheFirstSlot) {
   const MadeUpFile file(kSlot);
   const auto cache = OVBufferCache::initWithFile(file, SerialQueue::create(pool));
@@ -260,16 +286,10 @@ TEST_F(BufferCacheTest, DequeueingIntoASmallBufferStaysInsideIt) {
 
 TEST_F(BufferCacheTest, WithoutMemoryForASlotThereIsNoCacheAndALineSaysWhy) {
   const MadeUpFile file(kSlot);
-  rlimit limit{};
-  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &limit), 0);
-  const rlimit none{0, limit.rlim_max};
   const test::StandardErrorCapture log;
-  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
-  const auto cache = OVBufferCache::initWithFile(file, SerialQueue::create(pool));
-  ::setrlimit(RLIMIT_NOFILE, &limit);
-  EXPECT_EQ(cache, nullptr);
-  EXPECT_THAT(log.text(),
-              testing::HasSubstr("MVI_0001.MOV ! mmap failed for slot: 0 cause: Too many open files"));
+  const test::FileSizeLimit limit(kSlot - 1);
+  EXPECT_EQ(OVBufferCache::initWithFile(file, SerialQueue::create(pool)), nullptr);
+  EXPECT_THAT(log.text(), testing::HasSubstr("MVI_0001.MOV ! mmap failed for slot: 0 cause: File too large"));
 }
 
 TEST_F(BufferCacheTest, ASlotThatCannotBeMappedAgainIsLostAndTheOthersGoOn) {
@@ -279,16 +299,12 @@ TEST_F(BufferCacheTest, ASlotThatCannotBeMappedAgainIsLostAndTheOthersGoOn) {
   std::uint64_t size = 0;
   const auto piece = cache->consumeBufferAtOffset(0, size);
   cache->setConsumedOffset(0);
-  rlimit limit{};
-  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &limit), 0);
-  const rlimit none{0, limit.rlim_max};
-  const test::StandardErrorCapture log;
-  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
-  cache->resetBufferAtOffset(0);
-  const bool told = test::waitUntil([&] { return pool.waitUntilIdle(), true; });
-  ::setrlimit(RLIMIT_NOFILE, &limit);
-  EXPECT_TRUE(told);
-  EXPECT_THAT(log.text(), testing::HasSubstr("mmap failed for slot: 0"));
+  {
+    const test::StandardErrorCapture log;
+    const test::FileSizeLimit limit(kSlot - 1);
+    cache->resetBufferAtOffset(0);
+    EXPECT_THAT(log.text(), testing::HasSubstr("mmap failed for slot: 0"));
+  }
   for (std::uint64_t slot = 1; slot < 20; ++slot) EXPECT_EQ(take(*cache, slot * kSlot), kSlot);
 }
 

@@ -1,11 +1,10 @@
 // SPDX-License-Identifier: MIT
 #include <gmock/gmock.h>
-#include <sys/resource.h>
 
-#include <csignal>
 #include <filesystem>
 
 #include "orvidcore/client_test.h"
+#include "support/file_size_limit.h"
 
 namespace orvid::test {
 namespace {
@@ -278,22 +277,15 @@ TEST_F(SaveTest, AFileThatShrinksDuringASaveIsAnErrorAndNothingIsLeft) {
   EXPECT_THAT(saved(), IsEmpty());
 }
 
-/// Without descriptors of its own for buffers, the client has the service read ahead.
 TEST_F(SaveTest, WithoutMemoryToLendTheServiceReadsAhead) {
   const std::string content = pattern(kNineMegabytes);
   const Object object = onlyFile(content);
-  rlimit limit{};
-  ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &limit), 0);
-  const rlimit small{1'000'000, limit.rlim_max};  // no memfd of the buffers' size
-  const auto ignored = std::signal(SIGXFSZ, SIG_IGN);
-  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &small), 0);
   std::string streamed;
+  const brivo::test::FileSizeLimit limit(1'000'000);
   const auto result = object.stream(0, [&](std::span<const std::byte> piece) {
     streamed.append(reinterpret_cast<const char*>(piece.data()), piece.size());
     return true;
   });
-  ::setrlimit(RLIMIT_FSIZE, &limit);
-  std::signal(SIGXFSZ, ignored);
   EXPECT_TRUE(result.ok());
   EXPECT_TRUE(streamed == content);
 }

@@ -158,7 +158,7 @@ void printMemory(const Series& series) {
   const double objects = static_cast<double>(series.card.objects());
   const double megabytes = median(series.kilobytes) / 1024 / objects * kObjectsOfMemoryTarget;
   printFigure("resident memory per 100,000 objects", inUnits(megabytes, "MiB"), std::nullopt,
-              Target{"<= " + inUnits(kMostMegabytes, "MiB"), megabytes <= kMostMegabytes});
+              atMost(kMostMegabytes, megabytes, "MiB"));
 }
 
 void compareSizes(const Options& options) {

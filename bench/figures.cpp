@@ -37,8 +37,15 @@ double medianRatio(const std::vector<double>& values, const std::vector<double>&
 
 Target atMost(double limit, double value) { return {formatted("<= %.2f", limit), value <= limit}; }
 
+Target atMost(double limit, double value, const std::string& unit) {
+  return {"<= " + inUnits(limit, unit), value <= limit};
+}
+
+Target atLeast(double limit, double value) { return {formatted(">= %.2f", limit), value >= limit, "under"}; }
+
 Target within(double least, double most, double value) {
-  return {formatted("%.2f to ", least) + formatted("%.2f", most), least <= value && value <= most};
+  const char* missed = value < least ? "under" : "over";
+  return {formatted("%.2f to ", least) + formatted("%.2f", most), least <= value && value <= most, missed};
 }
 
 void printHeadings() { printLine("figure", "value", "ratio", "target", ""); }
@@ -46,7 +53,7 @@ void printHeadings() { printLine("figure", "value", "ratio", "target", ""); }
 void printFigure(const std::string& what, const std::string& value, std::optional<double> ratio,
                  const std::optional<Target>& target) {
   printLine(what.c_str(), value.c_str(), ratio ? formatted("%.2f", *ratio).c_str() : "-",
-            target ? target->text.c_str() : "-", target ? (target->met ? "ok" : "over") : "");
+            target ? target->text.c_str() : "-", target ? (target->met ? "ok" : target->missed) : "");
 }
 
 std::string inMilliseconds(double milliseconds) { return formatted("%.2f ms", milliseconds); }

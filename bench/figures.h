@@ -35,11 +35,16 @@ double median(std::vector<double> values);
 /// The median of the ratios of what was measured one after the other: of the same index in both.
 double medianRatio(const std::vector<double>& values, const std::vector<double>& bases);
 
+/// What a figure should be, whether it is, and the word for it when it is not.
 struct Target {
   std::string text;
   bool met;
+  const char* missed = "over";
 };
 Target atMost(double limit, double value);
+/// The same with the unit of both.
+Target atMost(double limit, double value, const std::string& unit);
+Target atLeast(double limit, double value);
 Target within(double least, double most, double value);
 
 /// Prints the headings of the columns.

@@ -24,6 +24,7 @@ class CountingClient final : public zeph::Connection {
   void setExportedObject(std::weak_ptr<zeph::ExportedObject>) override {}
   void setInterruptionHandler(Task) override {}
   void setInvalidationHandler(Task) override {}
+  void acceptBuffers() override {}
   void resume() override {}
   void invalidate() override {}
   bool isBacklogged() const override { return false; }

@@ -1,11 +1,9 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
-#include <sys/types.h>
-
 #include <string>
 
-#include "platform/base/unique_fd.h"
+#include "child_process.h"
 
 namespace brivo::bench {
 
@@ -15,16 +13,12 @@ class EchoProcess {
  public:
   /// Answers each `requestSize` bytes with `answer`.
   EchoProcess(std::size_t requestSize, const std::string& answer);
-  ~EchoProcess();
-  EchoProcess(const EchoProcess&) = delete;
-  EchoProcess& operator=(const EchoProcess&) = delete;
 
   /// The other end of its socket; once.
-  UniqueFd takeSocket() { return std::move(socket_); }
+  UniqueFd takeSocket() { return process_.takeSocket(); }
 
  private:
-  UniqueFd socket_;
-  pid_t pid_ = -1;
+  ChildProcess process_;
 };
 
 }  // namespace brivo::bench

@@ -3,17 +3,17 @@
 
 #include <fcntl.h>
 #include <signal.h>
-#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cmath>
 #include <filesystem>
 #include <fstream>
 #include <stdexcept>
 #include <thread>
 
+#include "command.h"
+#include "platform/base/unique_fd.h"
 #include "support/wait.h"
 
 namespace brivo::bench {
@@ -29,24 +29,20 @@ constexpr double kUnchangedKilobytes = 64;
 fs::path ownProgram() { return fs::read_symlink("/proc/self/exe"); }
 /// The folder of the build that this program belongs to.
 fs::path buildFolder() { return ownProgram().parent_path().parent_path(); }
-
-std::vector<char*> pointersTo(std::vector<std::string>& words) {
-  std::vector<char*> pointers;
-  std::ranges::transform(words, std::back_inserter(pointers), [](std::string& word) { return word.data(); });
-  pointers.push_back(nullptr);
-  return pointers;
-}
+std::string builtProgram(const std::string& name) { return buildFolder() / "bin" / name; }
 
 }  // namespace
 
 ServiceProcess::ServiceProcess(const std::string& volumes) : volumes_(volumes) {
   test::makeFolder(home_ / "data");
-  int status = 0;
-  ::waitpid(run("brivoctl", {"access", "grant", ownProgram()}), &status, 0);
-  if (status != 0) throw std::runtime_error("brivoctl access grant failed: " + test::readFile(home_ / "log"));
-  pid_ = run("brivod", {});
+  for (const std::string& program : {ownProgram().string(), builtProgram("brivoctl")}) {
+    if (brivoctl({"access", "grant", program}) != 0) {
+      throw std::runtime_error("brivoctl access grant failed: " + log());
+    }
+  }
+  pid_ = start("brivod", {});
   if (!test::waitUntil([this] { return fs::exists(managerSocket()); })) {
-    throw std::runtime_error("brivod did not start: " + test::readFile(home_ / "log"));
+    throw std::runtime_error("brivod did not start: " + log());
   }
 }
 
@@ -56,42 +52,45 @@ ServiceProcess::~ServiceProcess() {
   ::waitpid(pid_, nullptr, 0);
 }
 
-pid_t ServiceProcess::run(const std::string& program, const std::vector<std::string>& arguments) const {
-  std::vector<std::string> words{buildFolder() / "bin" / program};
+pid_t ServiceProcess::start(const std::string& program, const std::vector<std::string>& arguments) const {
+  std::vector<std::string> words{builtProgram(program)};
   words.insert(words.end(), arguments.begin(), arguments.end());
-  std::vector<std::string> variables{"HOME=" + home_.path(),
-                                     "BRIVOD_RUNTIME_DIR=" + (home_ / "run"),
-                                     "BRIVOD_VOLUME_ROOTS=" + (home_ / "mounts"),
-                                     "BRIVOD_VOLUME_FOLDERS=" + volumes_,
-                                     "XDG_DATA_HOME=" + (home_ / "data"),
-                                     "XDG_CONFIG_HOME=" + (home_ / "config"),
-                                     "XDG_DATA_DIRS=" + (buildFolder() / "share").string()};
-  const std::string log = home_ / "log";
-  const std::vector<char*> argv = pointersTo(words);
-  const std::vector<char*> environment = pointersTo(variables);
-  const pid_t child = ::fork();
-  if (child < 0) throw std::runtime_error("cannot fork");
-  if (child > 0) return child;
-  ::prctl(PR_SET_PDEATHSIG, SIGTERM);
-  const int fd = ::open(log.c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
-  ::dup2(fd, STDERR_FILENO);
-  ::dup2(fd, STDOUT_FILENO);
-  ::execve(argv[0], argv.data(), environment.data());
-  ::_exit(127);
+  const UniqueFd file(::open((home_ / "log").c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0600));
+  return bench::start({std::move(words),
+                       {"HOME=" + home_.path(), "BRIVOD_RUNTIME_DIR=" + (home_ / "run"),
+                        "BRIVOD_VOLUME_ROOTS=" + (home_ / "mounts"), "BRIVOD_VOLUME_FOLDERS=" + volumes_,
+                        "XDG_DATA_HOME=" + (home_ / "data"), "XDG_CONFIG_HOME=" + (home_ / "config"),
+                        "XDG_DATA_DIRS=" + (buildFolder() / "share").string()},
+                       file.get(),
+                       file.get()});
 }
+
+int ServiceProcess::brivoctl(const std::vector<std::string>& arguments) const {
+  return exitCodeOf(start("brivoctl", arguments));
+}
+
+std::string ServiceProcess::log() const { return test::readFile(home_ / "log"); }
 
 std::size_t ServiceProcess::threadCount() const {
   const fs::directory_iterator tasks("/proc/" + std::to_string(pid_) + "/task");
   return static_cast<std::size_t>(std::distance(fs::begin(tasks), fs::end(tasks)));
 }
 
-double ServiceProcess::residentKilobytes() const {
+double ServiceProcess::residentKilobytes() const { return kilobytesOf("VmRSS:"); }
+double ServiceProcess::peakKilobytes() const { return kilobytesOf("VmHWM:"); }
+
+double ServiceProcess::kilobytesOf(const std::string& line) const {
   std::ifstream status("/proc/" + std::to_string(pid_) + "/status");
   for (std::string word; status >> word;) {
     double kilobytes = 0;
-    if (word == "VmRSS:" && status >> kilobytes) return kilobytes;
+    if (word == line && status >> kilobytes) return kilobytes;
   }
-  throw std::runtime_error("brivod has ended: " + test::readFile(home_ / "log"));
+  throw std::runtime_error("brivod has ended: " + log());
+}
+
+void ServiceProcess::resetPeak() const {
+  constexpr const char* kPeakOfResidentMemory = "5";  // proc_pid_clear_refs(5)
+  std::ofstream("/proc/" + std::to_string(pid_) + "/clear_refs") << kPeakOfResidentMemory;
 }
 
 double ServiceProcess::settledKilobytes() const {

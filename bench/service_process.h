@@ -10,8 +10,8 @@
 
 namespace brivo::bench {
 
-/// The brivod of this build as a child process, with settings, database and log of its own. This program is
-/// granted the use of cameras. *Thread-bound.*
+/// The brivod of this build as a child process, with settings, database and log of its own. This program and
+/// brivoctl are granted the use of cameras. *Thread-bound.*
 class ServiceProcess {
  public:
   /// Serves the cards in the folder `volumes`. Throws when it does not come up.
@@ -29,9 +29,20 @@ class ServiceProcess {
   double residentKilobytes() const;
   /// The same when it has stopped changing.
   double settledKilobytes() const;
+  /// The most memory that has been resident since the last resetPeak(), in KiB; since the start of the
+  /// service where the kernel resets nothing.
+  double peakKilobytes() const;
+  void resetPeak() const;
+
+  /// Runs the brivoctl of this build as a client of the service; gives its exit code.
+  int brivoctl(const std::vector<std::string>& arguments) const;
+  /// What the service and brivoctl have printed.
+  std::string log() const;
 
  private:
-  pid_t run(const std::string& program, const std::vector<std::string>& arguments) const;
+  pid_t start(const std::string& program, const std::vector<std::string>& arguments) const;
+  /// A size in the process's status, by the word before it.
+  double kilobytesOf(const std::string& line) const;
 
   const test::TemporaryFolder home_;
   const std::string volumes_;

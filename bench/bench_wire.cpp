@@ -4,6 +4,7 @@
 
 #include "echo_process.h"
 #include "figures.h"
+#include "marshalled_options.h"
 #include "options.h"
 #include "support/raw_dbus.h"
 #include "support/wait.h"
@@ -15,12 +16,6 @@ namespace {
 constexpr std::size_t kOutstanding = 64;
 constexpr std::size_t kIdleClients = 200;
 constexpr char kContent = 'Z';
-
-std::string marshalled(std::uint64_t number) {
-  std::string bytes(sizeof number, '\0');
-  for (std::size_t i = 0; i < bytes.size(); ++i) bytes[i] = static_cast<char>(number >> 8 * i & 0xFF);
-  return bytes;
-}
 
 /// One kind of request.
 struct Request {

@@ -2,13 +2,13 @@
 #include "wire_client.h"
 
 #include <poll.h>
-#include <sys/socket.h>
 
 #include <algorithm>
 #include <array>
 #include <cstring>
 #include <stdexcept>
 
+#include "descriptor_message.h"
 #include "figures.h"
 #include "support/raw_dbus.h"
 
@@ -27,10 +27,18 @@ constexpr char kSignal = 4;
 constexpr std::string_view kEndOfAuthentication = "AGREE_UNIX_FD\r\n";
 constexpr int kQuietMilliseconds = 300;
 
-std::uint32_t numberAt(std::string_view bytes, std::size_t place) {
-  std::uint32_t number = 0;
-  std::memcpy(&number, bytes.substr(place, sizeof number).data(), sizeof number);
+template <class Number>
+Number loaded(std::string_view bytes, std::size_t place) {
+  Number number = 0;
+  const std::string_view here = bytes.substr(place, sizeof number);
+  std::memcpy(&number, here.data(), here.size());
   return number;
+}
+std::uint32_t numberAt(std::string_view bytes, std::size_t place) {
+  return loaded<std::uint32_t>(bytes, place);
+}
+std::uint64_t longNumberAt(std::string_view bytes, std::size_t place) {
+  return loaded<std::uint64_t>(bytes, place);
 }
 
 constexpr std::size_t aligned(std::size_t size, std::size_t boundary) {
@@ -39,6 +47,18 @@ constexpr std::size_t aligned(std::size_t size, std::size_t boundary) {
 
 std::size_t lengthOf(std::string_view message) {
   return kFixedHeader + aligned(numberAt(message, kFieldsLengthAt), 8) + numberAt(message, kBodyLengthAt);
+}
+
+/// Where the value under `key` lies; throws when it is not there or is not of the type `signature`.
+std::size_t placeOfValue(std::string_view key, std::string_view signature, std::size_t alignment,
+                         std::string_view message) {
+  const std::size_t found = message.find(key);
+  if (found == std::string_view::npos) throw std::runtime_error("no " + std::string(key) + " in the answer");
+  const std::size_t type = found + key.size() + sizeof '\0' + sizeof(std::uint8_t);  // behind its length
+  if (message.substr(type, signature.size()) != signature) {
+    throw std::runtime_error(std::string(key) + " in the answer is not " + std::string(signature));
+  }
+  return aligned(type + signature.size() + sizeof '\0', alignment);
 }
 
 }  // namespace
@@ -54,15 +74,32 @@ WireClient WireClient::authenticated(const std::string& path) {
 std::string WireClient::call(std::string_view interface, std::string_view member, std::string_view signature,
                              std::string_view body) {
   post(interface, member, signature, body);
-  while (true) {
-    const std::string_view message = receive();
-    if (message[kTypeAt] != kSignal) return std::string(message);
-  }
+  return std::string(receiveAnswer());
 }
 
 void WireClient::post(std::string_view interface, std::string_view member, std::string_view signature,
                       std::string_view body) {
   send(test::methodCall(++lastSerial_, interface, member, signature, body));
+}
+
+void WireClient::post(std::string_view interface, std::string_view member, std::string_view signature,
+                      std::string_view body, int descriptor) {
+  sendWithDescriptor(socket_.get(), test::methodCall(++lastSerial_, interface, member, signature, body, 1),
+                     descriptor);
+}
+
+std::string_view WireClient::receiveAnswer() {
+  while (true) {
+    const std::string_view message = receive();
+    if (message[kTypeAt] != kSignal) return message;
+  }
+}
+
+UniqueFd WireClient::takeDescriptor() {
+  if (descriptors_.empty()) throw std::runtime_error("no descriptor came with the answer");
+  UniqueFd first = std::move(descriptors_.front());
+  descriptors_.pop_front();
+  return first;
 }
 
 void WireClient::receiveUntil(std::string_view text, std::size_t times) {
@@ -110,17 +147,24 @@ void WireClient::receiveMore() {
   received_.erase(0, used_);
   used_ = 0;
   std::array<char, 65'536> buffer;
-  const ssize_t count = ::recv(socket_.get(), buffer.data(), buffer.size(), 0);
+  const std::ptrdiff_t count = receiveWithDescriptors(socket_.get(), buffer, descriptors_);
   if (count <= 0) throw std::runtime_error("the peer hung up");
   received_.append(buffer.data(), static_cast<std::size_t>(count));
 }
 
 std::string textUnder(std::string_view key, std::string_view message) {
-  const std::size_t found = message.find(key);
-  if (found == std::string_view::npos) throw std::runtime_error("no " + std::string(key) + " in the answer");
-  constexpr std::size_t kSignatureOfText = 3;  // its length, "s" and the zero at its end
-  const std::size_t length = aligned(found + key.size() + 1 + kSignatureOfText, sizeof(std::uint32_t));
-  return std::string(message.substr(length + sizeof(std::uint32_t), numberAt(message, length)));
+  const std::size_t place = placeOfValue(key, "s", sizeof(std::uint32_t), message);
+  return std::string(message.substr(place + sizeof(std::uint32_t), numberAt(message, place)));
+}
+
+std::uint64_t numberUnder(std::string_view key, std::string_view message) {
+  return longNumberAt(message, placeOfValue(key, "t", sizeof(std::uint64_t), message));
+}
+
+std::uint64_t memorySizeUnder(std::string_view key, std::string_view message) {
+  // Behind the index of the descriptor, padded.
+  return longNumberAt(message,
+                      placeOfValue(key, "(ht)", sizeof(std::uint64_t), message) + sizeof(std::uint64_t));
 }
 
 }  // namespace brivo::bench

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <deque>
 #include <string>
 #include <string_view>
 
@@ -24,6 +25,13 @@ class WireClient {
   /// Sends a method call and leaves its answer to be received.
   void post(std::string_view interface, std::string_view member, std::string_view signature = "",
             std::string_view body = "");
+  /// The same with a descriptor that goes along; it stays the caller's.
+  void post(std::string_view interface, std::string_view member, std::string_view signature,
+            std::string_view body, int descriptor);
+  /// The next answer, whole, valid until the next call; signals that come before are dropped.
+  std::string_view receiveAnswer();
+  /// The descriptor that came first of those that have not been taken. Throws when there is none.
+  UniqueFd takeDescriptor();
   /// Receives messages until `text` has been seen in them so many times.
   void receiveUntil(std::string_view text, std::size_t times);
   /// Drops what arrives until nothing has for a while.
@@ -43,9 +51,17 @@ class WireClient {
   std::uint32_t lastSerial_ = 0;
   std::string received_;
   std::size_t used_ = 0;
+  std::deque<UniqueFd> descriptors_;  // that came with what was received, oldest first
 };
 
-/// The text under `key` in a message that holds it as a variant in a dictionary. Throws when it is not there.
+// What is under a key in a message that holds it as a variant in a dictionary. Each throws when it is not
+// there, or is something else.
+
+/// A text.
 std::string textUnder(std::string_view key, std::string_view message);
+/// A number of 64 bits.
+std::uint64_t numberUnder(std::string_view key, std::string_view message);
+/// How many bytes of a descriptor that came along count.
+std::uint64_t memorySizeUnder(std::string_view key, std::string_view message);
 
 }  // namespace brivo::bench

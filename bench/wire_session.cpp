@@ -4,6 +4,7 @@
 #include <stdexcept>
 
 #include "figures.h"
+#include "marshalled_options.h"
 #include "support/raw_dbus.h"
 #include "support/wait.h"
 
@@ -20,11 +21,12 @@ WireSession::WireSession(const Card& card)
     : card_(card),
       service_(card.volumes()),
       manager_(WireClient::authenticated(service_.managerSocket())),
-      device_(openDevice()) {
+      deviceSocket_(openDevice()),
+      device_(WireClient::authenticated(deviceSocket_)) {
   device_.call(kDeviceInterface, "requestStartUsingDeviceWithReply");
 }
 
-WireClient WireSession::openDevice() {
+std::string WireSession::openDevice() {
   std::string devices;
   const auto listsTheCard = [&] {
     devices = manager_.call(kManagerInterface, "requestDeviceListWithReply");
@@ -34,7 +36,7 @@ WireClient WireSession::openDevice() {
   const std::string handle = test::marshalledString(textUnder("OVDeviceHandle", devices));
   const std::string opened = manager_.call(kManagerInterface, "openDevice_withReply", "s", handle);
   const std::string address = textUnder("OVDeviceEndpoint", opened);
-  return WireClient::authenticated(address.substr(address.find('/')));
+  return address.substr(address.find('/'));
 }
 
 double WireSession::enumerate() {
@@ -44,8 +46,6 @@ double WireSession::enumerate() {
   return watch.milliseconds();
 }
 
-std::string noOptions() {
-  return std::string(8, '\0');  // the length, and the alignment of entries
-}
+std::string noOptions() { return MarshalledOptions().bytes(); }
 
 }  // namespace brivo::bench

@@ -20,15 +20,19 @@ class WireSession {
 
   const ServiceProcess& service() const { return service_; }
   WireClient& device() { return device_; }
+  /// Where other processes reach the device.
+  const std::string& deviceSocket() const { return deviceSocket_; }
   /// Asks for the catalogue and reads until all files of the card have come; gives the milliseconds.
   double enumerate();
 
  private:
-  WireClient openDevice();
+  /// The path of the device's socket.
+  std::string openDevice();
 
   const Card& card_;
   const ServiceProcess service_;
   WireClient manager_;
+  const std::string deviceSocket_;
   WireClient device_;
 };
 

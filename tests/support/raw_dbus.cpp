@@ -66,6 +66,13 @@ void appendField(std::string& bytes, char code, char type, std::string_view text
   }
 }
 
+/// A header field: its code and a variant of an unsigned number.
+void appendNumberField(std::string& bytes, char code, std::uint32_t number) {
+  align(bytes, 8);
+  bytes += {code, 1, 'u', 0};
+  append32(bytes, number);
+}
+
 }  // namespace
 
 std::string marshalledString(std::string_view text) {
@@ -75,12 +82,13 @@ std::string marshalledString(std::string_view text) {
 }
 
 std::string methodCall(std::uint32_t serial, std::string_view interface, std::string_view member,
-                       std::string_view signature, std::string_view body) {
+                       std::string_view signature, std::string_view body, std::uint32_t descriptors) {
   std::string fields(16, '\0');  // stands for what comes before, so that alignment comes out right
   appendField(fields, 1, 'o', "/org/orvid/brivod");
   appendField(fields, 2, 's', interface);
   appendField(fields, 3, 's', member);
   if (!signature.empty()) appendField(fields, 8, 'g', signature);
+  if (descriptors > 0) appendNumberField(fields, 9, descriptors);
   fields.erase(0, 16);
   std::string message = {'l', 1, 0, 1};  // little-endian, method call, no flags, version 1
   append32(message, static_cast<std::uint32_t>(body.size()));

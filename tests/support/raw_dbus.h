@@ -16,9 +16,11 @@ UniqueFd connectRaw(const std::string& path);
 
 /// The lines that authenticate as this user and negotiate descriptors, "BEGIN" included.
 std::string authentication();
-/// A method call without arguments, in wire format. `body` may be given with its signature.
+/// A method call without arguments, in wire format. `body` may be given with its signature, and with the
+/// number of descriptors that will be sent along.
 std::string methodCall(std::uint32_t serial, std::string_view interface, std::string_view member,
-                       std::string_view signature = "", std::string_view body = "");
+                       std::string_view signature = "", std::string_view body = "",
+                       std::uint32_t descriptors = 0);
 /// `text` as a marshalled D-Bus string.
 std::string marshalledString(std::string_view text);
 

@@ -1,9 +1,15 @@
 // SPDX-License-Identifier: MIT
 #include "card.h"
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <algorithm>
 #include <array>
 #include <cstdio>
+#include <stdexcept>
+
+#include "platform/base/unique_fd.h"
 
 namespace brivo::bench {
 
@@ -13,24 +19,63 @@ constexpr std::size_t kFilesPerFolder = 999;
 constexpr std::size_t kFirstFolder = 100;
 constexpr std::size_t kMediaRoots = 1;
 
+constexpr std::size_t kBlock = 1'048'576;
+
 std::size_t folderCount(std::size_t files) { return (files + kFilesPerFolder - 1) / kFilesPerFolder; }
 
-void fillFolder(const std::string& folder, std::size_t files, const std::string& content) {
-  for (std::size_t i = 1; i <= files; ++i) {
-    std::array<char, 32> name{};
-    std::snprintf(name.data(), name.size(), "/IMG_%04zu.JPG", i);
-    test::writeFile(folder + name.data(), content);
-  }
+std::string folder(std::size_t index) { return "/DCIM/" + std::to_string(kFirstFolder + index) + "ABCDE"; }
+
+std::string name(std::size_t number) {
+  std::array<char, 32> text{};
+  std::snprintf(text.data(), text.size(), "IMG_%04zu.JPG", number);
+  return text.data();
+}
+
+void fillFolder(const std::string& path, std::size_t files, const FileMaker& make) {
+  test::makeFolder(path);
+  for (std::size_t i = 1; i <= files; ++i) make(path + "/" + name(i));
+}
+
+UniqueFd created(const std::string& path) {
+  UniqueFd file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+  if (!file) throw std::runtime_error("cannot make " + path);
+  return file;
 }
 
 }  // namespace
 
-Card::Card(std::size_t files, const std::string& content) : path_(volumes_ / "CARD"), files_(files) {
-  for (std::size_t made = 0; made < files; made += kFilesPerFolder) {
-    const std::string number = std::to_string(kFirstFolder + made / kFilesPerFolder);
-    fillFolder(path_ + "/DCIM/" + number + "ABCDE", std::min(kFilesPerFolder, files - made), content);
+FileMaker ofBytes(std::uint64_t size) {
+  return [size](const std::string& path) {
+    const UniqueFd file = created(path);
+    const std::string block(kBlock, '.');
+    for (std::uint64_t left = size; left > 0;) {
+      const ssize_t written = ::write(file.get(), block.data(), std::min<std::uint64_t>(left, kBlock));
+      if (written <= 0) throw std::runtime_error("cannot write " + path);
+      left -= static_cast<std::uint64_t>(written);
+    }
+    ::fdatasync(file.get());
+  };
+}
+
+FileMaker ofNothing(std::uint64_t size) {
+  return [size](const std::string& path) {
+    if (::ftruncate(created(path).get(), static_cast<off_t>(size)) != 0) {
+      throw std::runtime_error("cannot make " + path + " so large");
+    }
+  };
+}
+
+Card::Card(std::size_t files, const std::string& content)
+    : Card(files, [&](const std::string& path) { test::writeFile(path, content); }) {}
+
+Card::Card(std::size_t files, const FileMaker& make) : path_(volumes_ / "CARD"), files_(files) {
+  for (std::size_t i = 0; i < folderCount(files); ++i) {
+    fillFolder(path_ + folder(i), std::min(kFilesPerFolder, files - i * kFilesPerFolder), make);
   }
 }
+
+std::string Card::firstFolder() { return folder(0); }
+std::string Card::firstName() { return name(1); }
 
 std::size_t Card::objects() const { return kMediaRoots + folderCount(files_) + files_; }
 

@@ -2,11 +2,20 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
+#include <functional>
 #include <string>
 
 #include "support/temporary_folder.h"
 
 namespace brivo::bench {
+
+/// Makes the file at a path, whose folder is there.
+using FileMaker = std::function<void(const std::string& path)>;
+/// A file of `size` bytes that are on the disk and in the page cache.
+FileMaker ofBytes(std::uint64_t size);
+/// A file of `size` bytes without a block on the disk: it reads as zeros.
+FileMaker ofNothing(std::uint64_t size);
 
 /// A camera card in a temporary folder: "DCIM/100ABCDE/IMG_0001.JPG" and so on, 999 files in a folder, each
 /// an inode of its own.
@@ -14,10 +23,16 @@ class Card {
  public:
   /// A card with `files` files that hold `content`.
   explicit Card(std::size_t files, const std::string& content = "JPEG");
+  /// A card with `files` files made by `make`.
+  Card(std::size_t files, const FileMaker& make);
 
   /// The folder above the card, for BRIVOD_VOLUME_FOLDERS.
   const std::string& volumes() const { return volumes_.path(); }
   const std::string& path() const { return path_; }
+  /// The path of the first file, and what it is on the card.
+  std::string firstFile() const { return path_ + firstFolder() + "/" + firstName(); }
+  static std::string firstFolder();
+  static std::string firstName();
   std::size_t files() const { return files_; }
   /// Files and folders.
   std::size_t objects() const;

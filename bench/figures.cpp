@@ -56,6 +56,8 @@ void printFigure(const std::string& what, const std::string& value, std::optiona
             target ? target->text.c_str() : "-", target ? (target->met ? "ok" : target->missed) : "");
 }
 
+void printNote(const std::string& text) { std::printf("%s\n", text.c_str()); }
+
 std::string inMilliseconds(double milliseconds) { return formatted("%.2f ms", milliseconds); }
 
 std::string inUnits(double number, const std::string& unit) { return formatted("%.1f ", number) + unit; }

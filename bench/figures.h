@@ -55,6 +55,9 @@ void printFigure(const std::string& what, const std::string& value,
                  std::optional<double> ratio = std::nullopt,
                  const std::optional<Target>& target = std::nullopt);
 
+/// Prints a line of text in the place of a figure.
+void printNote(const std::string& text);
+
 /// "12.34 ms".
 std::string inMilliseconds(double milliseconds);
 /// A number with `unit`, to one digit after the point.

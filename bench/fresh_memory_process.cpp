@@ -16,6 +16,10 @@
 #include "descriptor_message.h"
 #include "platform/base/mapping.h"
 
+#ifndef F_SEAL_FUTURE_WRITE
+#define F_SEAL_FUTURE_WRITE 0x0010
+#endif
+
 namespace brivo::bench {
 
 namespace {
@@ -27,25 +31,32 @@ struct Part {
 
 constexpr std::string_view kAnswer = ".";
 
-bool fillByMapping(int memory, int file, const Part& part) {
-  const Mapping mapping = Mapping::sharedWritable(memory, part.length);
-  return ::pread(file, mapping.bytes().data(), part.length, static_cast<off_t>(part.offset)) ==
-         static_cast<ssize_t>(part.length);
+void check(bool isDone) {
+  if (!isDone) throw std::runtime_error("cannot make or fill memory");
 }
 
-bool fillBySendfile(int memory, int file, const Part& part) {
+void fillByMapping(int memory, int file, const Part& part) {
+  const Mapping mapping = Mapping::sharedWritable(memory, part.length);
+  check(::pread(file, mapping.bytes().data(), part.length, static_cast<off_t>(part.offset)) ==
+        static_cast<ssize_t>(part.length));
+}
+
+void fillBySendfile(int memory, int file, const Part& part) {
   auto offset = static_cast<off_t>(part.offset);
-  return ::sendfile(memory, file, &offset, part.length) == static_cast<ssize_t>(part.length);
+  for (std::uint64_t left = part.length; left > 0;) {
+    const ssize_t sent = ::sendfile(memory, file, &offset, left);
+    check(sent > 0);
+    left -= static_cast<std::uint64_t>(sent);
+  }
 }
 
 UniqueFd freshMemory(int file, const Part& part, Filling filling) {
   UniqueFd memory(::memfd_create("bench-part", MFD_CLOEXEC | MFD_ALLOW_SEALING));
-  if (::ftruncate(memory.get(), static_cast<off_t>(part.length)) != 0) throw std::runtime_error("no memory");
-  const bool filled = filling == Filling::byMapping ? fillByMapping(memory.get(), file, part)
-                                                    : fillBySendfile(memory.get(), file, part);
-  constexpr int seals = F_SEAL_SHRINK | F_SEAL_GROW | F_SEAL_WRITE | F_SEAL_SEAL;
-  if (!filled || ::fcntl(memory.get(), F_ADD_SEALS, seals) != 0)
-    throw std::runtime_error("cannot fill memory");
+  check(::ftruncate(memory.get(), static_cast<off_t>(part.length)) == 0);
+  (filling == Filling::byMapping ? fillByMapping : fillBySendfile)(memory.get(), file, part);
+  // The seals of the service.
+  constexpr int seals = F_SEAL_SHRINK | F_SEAL_GROW | F_SEAL_FUTURE_WRITE | F_SEAL_SEAL;
+  check(::fcntl(memory.get(), F_ADD_SEALS, seals) == 0);
   return memory;
 }
 

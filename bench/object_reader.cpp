@@ -88,14 +88,13 @@ std::uint64_t ObjectReader::takePiece(std::uint64_t offset) {
 void ObjectReader::readIntoBuffers() {
   if (!buffers_) buffers_.emplace(std::array{makeBuffer(), makeBuffer()});
   openStreamFor(buffers_->front());
-  requestInto(buffers_->front(), 0);
-  for (std::uint64_t offset = 0, piece = 0; offset < size_; ++piece) {
-    const Buffer& filled = (*buffers_)[piece % buffers_->size()];
-    const std::uint64_t count = receiveCount();
-    if (count != pieceAt(offset)) throw std::runtime_error("a read into a buffer is too short");
-    offset += count;
-    if (offset < size_) requestInto((*buffers_)[(piece + 1) % buffers_->size()], offset);
-    touch(filled.mapping.bytes().first(count));
+  std::uint64_t requested = 0;
+  for (const Buffer& buffer : *buffers_) requested += requestInto(buffer, requested);
+  for (std::uint64_t received = 0; received < size_;) {
+    for (const Buffer& buffer : *buffers_) {
+      received += touchWhatCame(buffer, received);
+      requested += requestInto(buffer, requested);
+    }
   }
   closeStream();
 }
@@ -116,15 +115,23 @@ void ObjectReader::openStreamFor(const Buffer& buffer) {
   client_.receiveAnswer();
 }
 
-void ObjectReader::requestInto(const Buffer& buffer, std::uint64_t offset) {
-  const std::string options =
-      rangeOptions(offset, pieceAt(offset)).setMemory(keys::kReadBuffer, kPiece).bytes();
+std::uint64_t ObjectReader::requestInto(const Buffer& buffer, std::uint64_t offset) {
+  const std::uint64_t length = pieceAt(offset);
+  if (length == 0) return 0;
+  const std::string options = rangeOptions(offset, length).setMemory(keys::kReadBuffer, kPiece).bytes();
   client_.post(kDeviceInterface, kReadMember, kReadSignature, marshalled(handle_) + options,
                buffer.file.fd());
+  return length;
 }
 
-std::uint64_t ObjectReader::receiveCount() {
-  return numberUnder(keys::kReadBufferCount, client_.receiveAnswer());
+std::uint64_t ObjectReader::touchWhatCame(const Buffer& buffer, std::uint64_t offset) {
+  const std::uint64_t length = pieceAt(offset);
+  if (length == 0) return 0;
+  if (numberUnder(keys::kReadBufferCount, client_.receiveAnswer()) != length) {
+    throw std::runtime_error("a read into a buffer is too short");
+  }
+  touch(buffer.mapping.bytes().first(length));
+  return length;
 }
 
 }  // namespace brivo::bench

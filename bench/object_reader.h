@@ -57,11 +57,13 @@ class ObjectReader {
   void openStream();
   void openStreamFor(const Buffer& buffer);
   void closeStream();
+  /// The size of the piece at `offset`; 0 at the end.
   std::uint64_t pieceAt(std::uint64_t offset) const;
   /// Touches the piece, and gives its size.
   std::uint64_t takePiece(std::uint64_t offset);
-  void requestInto(const Buffer& buffer, std::uint64_t offset);
-  std::uint64_t receiveCount();
+  // Each gives the size of the piece at `offset`, and does nothing when there is none.
+  std::uint64_t requestInto(const Buffer& buffer, std::uint64_t offset);
+  std::uint64_t touchWhatCame(const Buffer& buffer, std::uint64_t offset);
 
   WireClient& client_;
   const std::uint64_t handle_;

@@ -95,12 +95,15 @@ Importer::Failure Importer::copy(const orvid::Object& object, Copied& copied) {
       0,
       [&](std::span<const std::byte> piece) {
         const std::uint64_t before = copied.part->size();
-        if (before < ImportReceipt::kHeadSize) {
-          headDigest.add(
-              piece.first(std::min<std::uint64_t>(piece.size(), ImportReceipt::kHeadSize - before)));
-        }
-        digest.add(piece);
+        digesting_->post([&, piece, before] {
+          if (before < ImportReceipt::kHeadSize) {
+            headDigest.add(
+                piece.first(std::min<std::uint64_t>(piece.size(), ImportReceipt::kHeadSize - before)));
+          }
+          digest.add(piece);
+        });
         failure = textOf(copied.part->append(piece));
+        digesting_->runAndWait([] {});  // the piece is gone after this
         progress_.reached(copied.part->size());
         return !failure && !stop_;
       },

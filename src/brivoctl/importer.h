@@ -13,6 +13,7 @@
 #include "brivoctl/transfer_progress.h"
 #include "platform/files/part_file.h"
 #include "platform/work/pool.h"
+#include "platform/work/serial_queue.h"
 
 namespace brivoctl {
 
@@ -63,7 +64,8 @@ class Importer {
 
   /// Files on their way to the disk: enough to keep it busy, few enough to be seen through quickly.
   static constexpr std::ptrdiff_t kMostUnsettled = 8;
-  static constexpr std::size_t kSettlers = 3;
+  /// Most of them wait for the disk, which writes the journal once for those that wait together.
+  static constexpr std::size_t kSettlers = 6;
 
   const Options options_;
   ImportReceipt& receipt_;
@@ -74,6 +76,8 @@ class Importer {
   Outcome outcome_;
   std::set<std::string> names_;
   std::counting_semaphore<kMostUnsettled> room_{kMostUnsettled};
+  brivo::Pool digesters_{1};
+  const std::shared_ptr<brivo::SerialQueue> digesting_ = brivo::SerialQueue::create(digesters_);
   brivo::Pool settlers_{kSettlers};  // last: uses everything above
 };
 

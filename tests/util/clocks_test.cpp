@@ -16,6 +16,10 @@ TEST(ClocksTest, ATickIsANanosecond) {
   EXPECT_DOUBLE_EQ(OVConvertTimebaseToMilliseconds(0), 0.0);
 }
 
+TEST(ClocksTest, NegativeTicksCountAsLargeUnsignedOnes) {
+  EXPECT_DOUBLE_EQ(OVConvertTimebaseToMilliseconds(-1), 18'446'744'073'709.551615);
+}
+
 TEST(ClocksTest, TheBenchmarkLineMarksMoreThan300Milliseconds) {
   EXPECT_EQ(benchmarkLine("Total Enumeration Time", 12.4F), "Total Enumeration Time   [   12 ms] {𝚫}");
   EXPECT_EQ(benchmarkLine("x", 300.0F), "x   [  300 ms] {𝚫}");

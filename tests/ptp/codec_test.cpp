@@ -229,5 +229,57 @@ TEST(CodecTest, CheckedArrayReadersAtEveryLimit) {
   EXPECT_THAT(capture.text(), HasSubstr("invalid buffer for object handles"));
 }
 
+TEST(CodecTest, WhatIsWrittenReadsBackForRandomArrays) {
+  std::mt19937 random(3);
+  for (int i = 0; i < 300; ++i) {
+    std::vector<std::uint16_t> shorts(random() % 200);
+    for (auto& element : shorts) element = static_cast<std::uint16_t>(random());
+    std::vector<std::uint32_t> handles(random() % 200);
+    for (auto& element : handles) element = static_cast<std::uint32_t>(random());
+    Buffer buffer;
+    PTPWriteCursor out = buffer.writing();
+    WriteArrayOfUnsignedShortsToBuffer(out, shorts);
+    WriteArrayOfHandlesToBuffer(out, handles);
+    PTPReadCursor in = buffer.reading();
+    EXPECT_EQ(CopyArrayOfUnsignedShortsFromBuffer(in), shorts);
+    EXPECT_EQ(CopyArrayOfHandlesFromBuffer(in), handles);
+    EXPECT_EQ(in, out);
+    in = buffer.reading();
+    EXPECT_EQ(CopyArrayOfUnsignedShortsFromBufferMaxSize(in, out), shorts);
+    EXPECT_EQ(CopyArrayOfHandlesFromBufferMaxSize(in, out), handles);
+    EXPECT_EQ(in, out);
+  }
+}
+
+TEST(CodecTest, CheckedStringReadersAtEveryLimitForRandomStrings) {
+  std::mt19937 random(4);
+  for (int i = 0; i < 30; ++i) {
+    const std::u16string string(1 + random() % 60, u'x');
+    Buffer buffer;
+    PTPWriteCursor out = buffer.writing();
+    WriteUnicodeStringWithLengthByteToBuffer(out, string);
+    for (std::ptrdiff_t limit = 0; limit <= out - buffer.writing(); ++limit) {
+      PTPReadCursor in = buffer.reading();
+      const bool passes = limit >= static_cast<std::ptrdiff_t>(string.size() + 1);
+      const auto read = CopyUnicodeStringWithLengthByteFromBufferMaxSize(in, buffer.reading() + limit);
+      EXPECT_EQ(read, passes ? std::optional(string) : std::nullopt);
+      EXPECT_EQ(in, passes ? out : buffer.reading());
+    }
+  }
+}
+
+TEST(CodecTest, ACheckedArraySizeIsComputedIn32Bits) {
+  // The products of these counts wrap, to more than there is.
+  const Buffer shorts{0xFF, 0xFF, 0xFF, 0x80};
+  PTPReadCursor in = shorts.reading();
+  EXPECT_EQ(CopyArrayOfUnsignedShortsFromBufferMaxSize(in, shorts.reading() + 100), std::nullopt);
+  EXPECT_EQ(in, shorts.reading());
+  const Buffer handles{0xFF, 0xFF, 0xFF, 0x40};
+  in = handles.reading();
+  const test::StandardErrorCapture capture;
+  EXPECT_EQ(CopyArrayOfHandlesFromBufferMaxSize(in, handles.reading() + 100), std::nullopt);
+  EXPECT_EQ(in, handles.reading());
+}
+
 }  // namespace
 }  // namespace brivo

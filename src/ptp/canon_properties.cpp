@@ -168,10 +168,15 @@ constexpr PTPCodeName kProperties[] = {
     {0xD1DE, "CanonLCDBrightness"},
     {0xD1DF, "CanonCADarkBright"},
 };
+
+constexpr PTPCodeName kElsewhere[] = {
+    {0xD02C, "CanonImageQualityEnumeration"},
+};
 // clang-format on
 
 }  // namespace
 
 std::span<const PTPCodeName> canonProperties() { return kProperties; }
+std::span<const PTPCodeName> canonPropertiesElsewhere() { return kElsewhere; }
 
 }  // namespace brivo

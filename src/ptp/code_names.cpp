@@ -76,8 +76,8 @@ std::string stringForObjectFormatCode(std::uint32_t code) {
 }
 
 std::string stringForCanonProperty(std::uint32_t code) {
-  if (code == 0xD02C) return "CanonImageQualityEnumeration";  // far from the codes of the table
-  return nameOr(canonProperties(), code, "Undefined Canon Property");
+  return nameOr(canonProperties(), code,
+                nameOr(canonPropertiesElsewhere(), code, "Undefined Canon Property"));
 }
 
 std::optional<std::string> stringForFunctionalMode(std::uint32_t code) {

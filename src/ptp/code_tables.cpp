@@ -14,6 +14,7 @@ std::span<const PTPCodeTable> allPTPCodeTables() {
       PTPCodeTable{"device property", devicePropCodes()},
       PTPCodeTable{"object format", objectFormatCodes()},
       PTPCodeTable{"vendor property", canonProperties()},
+      PTPCodeTable{"vendor property", canonPropertiesElsewhere()},
       PTPCodeTable{"functional mode", functionalModes()},
       PTPCodeTable{"storage type", storageTypes()},
       PTPCodeTable{"file-system type", filesystemTypes()},

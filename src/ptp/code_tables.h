@@ -21,6 +21,8 @@ std::span<const PTPCodeName> devicePropCodes();
 std::span<const PTPCodeName> objectFormatCodes();
 /// Device properties of one vendor.
 std::span<const PTPCodeName> canonProperties();
+/// The one whose code is far from those.
+std::span<const PTPCodeName> canonPropertiesElsewhere();
 std::span<const PTPCodeName> functionalModes();
 std::span<const PTPCodeName> storageTypes();
 std::span<const PTPCodeName> filesystemTypes();

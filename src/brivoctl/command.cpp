@@ -7,6 +7,8 @@
 #include <cstdio>
 #include <system_error>
 
+#include "brivoctl/code_explanations.h"
+
 namespace brivoctl {
 
 namespace {
@@ -23,6 +25,13 @@ std::string secondsError(const std::string& argument) {
   return isTime ? "" : argument + " is no number of seconds from 0 to 86400";
 }
 
+/// An error code and what is known of it, to go behind a text.
+std::string inBrackets(std::int32_t code) {
+  const std::string description = describeError(code);
+  return description.empty() ? fmt::format(" (error {})", code)
+                             : fmt::format(" (error {}, {})", code, description);
+}
+
 }  // namespace
 
 ExitCode fail(const std::string& text, ExitCode code) {
@@ -37,7 +46,7 @@ std::string textOf(const orvid::Error& error) {
     case orvid::ErrorKind::refused:
       return error.text + "; see brivoctl access --help";
     default:
-      return error.code == 0 ? error.text : fmt::format("{} (error {})", error.text, error.code);
+      return error.code == 0 ? error.text : error.text + inBrackets(error.code);
   }
 }
 

@@ -37,5 +37,6 @@ void addDeviceCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode)
 void addObjectCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addTransferCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addAccessCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
+void addExplainCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 
 }  // namespace brivoctl

@@ -23,6 +23,7 @@ int main(int argc, char** argv) {
   addObjectCommands(app, common, exitCode);
   addTransferCommands(app, common, exitCode);
   addAccessCommands(app, common, exitCode);
+  addExplainCommands(app, common, exitCode);
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {

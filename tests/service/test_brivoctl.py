@@ -188,6 +188,11 @@ class ReadTest(BrivoctlTest):
             with self.subTest(options):
                 self.assertEqual(self.brivoctl("read", FIRST, *options, code=FAILURE).stdout, b"")
 
+    def test_a_failure_of_the_service_shows_its_code_and_what_is_known_of_it(self):
+        self.card()
+        message = self.brivoctl("read", FIRST, "--length", "14", code=FAILURE).stderr
+        self.assertTrue(message.endswith(b" (error -21449, bad range)\n"), message)
+
     def test_as_json_the_bytes_are_base64(self):
         self.card(files={"100ABCDE/IMG_0001.JPG": bytes(range(256))})
         document = self.json("read", FIRST, "--offset", "200")

@@ -38,7 +38,7 @@ installed() { (cd "$prefix" && find . ! -type d | sed -e 's|^\./||' -e 's|Target
 expected() {
   printf '%s\n' bin/brivoctl bin/brivod \
     include/orvidcore/{device,device_browser,object,orvidcore,result}.h \
-    include/orvidcore/platform/base/{data,result,url,value}.h \
+    include/orvidcore/platform/base/{data,result,shared_buffer,url,value}.h \
     "$libdir"/cmake/OrvidCore/OrvidCore{Config,ConfigVersion,Targets,Targets-CONFIG}.cmake \
     "$libdir"/libOrvidCore.so{,.0,".$version"} "$libdir/pkgconfig/orvidcore.pc" \
     share/OrvidCore/DeviceMatchingInfo.plist share/applications/org.orvid.Photos.desktop

@@ -6,6 +6,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "platform/base/mapping.h"
+#include "platform/base/unique_fd.h"
+
 namespace brivo {
 
 namespace {
@@ -19,6 +22,11 @@ std::optional<struct stat> sealedStatus(int fd) {
 }
 
 }  // namespace
+
+SharedBuffer::SharedBuffer(UniqueFd fd, std::uint64_t size)
+    : fd_(std::make_shared<const UniqueFd>(std::move(fd))), size_(size) {}
+
+int SharedBuffer::fd() const { return fd_->get(); }
 
 std::optional<SharedBuffer> SharedBuffer::create(const char* name, std::size_t size) {
   UniqueFd fd(::memfd_create(name, MFD_CLOEXEC | MFD_ALLOW_SEALING));

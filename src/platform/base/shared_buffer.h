@@ -8,10 +8,10 @@
 #include <optional>
 #include <utility>
 
-#include "platform/base/mapping.h"
-#include "platform/base/unique_fd.h"
-
 namespace brivo {
+
+class Mapping;
+class UniqueFd;
 
 /// A memfd on its way from the process that owns it to the one that fills it. Whoever receives one knows
 /// nothing of it yet: mapped() finds out. *Immutable*; copies stand for the same file.
@@ -22,14 +22,13 @@ class SharedBuffer {
   using Identity = std::pair<std::uint64_t, std::uint64_t>;
 
   /// What another process sent: a descriptor of anything, and how many bytes it is said to hold.
-  SharedBuffer(UniqueFd fd, std::uint64_t size)
-      : fd_(std::make_shared<const UniqueFd>(std::move(fd))), size_(size) {}
+  SharedBuffer(UniqueFd fd, std::uint64_t size);
   /// Zeroed memory of `size` bytes, sealed against shrinking (memfd_create(2)). None when memory or
   /// descriptors run out.
   static std::optional<SharedBuffer> create(const char* name, std::size_t size);
 
   /// Borrowed.
-  int fd() const { return fd_->get(); }
+  int fd() const;
   std::uint64_t size() const { return size_; }
   /// None unless the descriptor is a memfd that cannot shrink. Other files are not touched: asking one on a
   /// file system that does not answer would wait.

@@ -6,6 +6,8 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
+#include "platform/base/mapping.h"
+#include "platform/base/unique_fd.h"
 #include "support/temporary_folder.h"
 
 namespace brivo {

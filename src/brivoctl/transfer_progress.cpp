@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdio>
 
 #include "brivoctl/command.h"
@@ -115,8 +116,8 @@ std::string TransferProgress::bar(int columns) const {
   const double share = size_ == 0 ? 1 : static_cast<double>(done) / static_cast<double>(size_);
   const double seconds = std::chrono::duration<double>(Clock::now() - start_).count();
   const double rate = done > given_ ? static_cast<double>(done - given_) / seconds : 0;
-  const auto left = std::chrono::seconds(
-      rate > 0 ? static_cast<std::int64_t>(static_cast<double>(size_ - done) / rate + 0.5) : 0);
+  const auto left =
+      std::chrono::seconds(rate > 0 ? std::llround(static_cast<double>(size_ - done) / rate) : 0);
   const std::string figures =
       fmt::format(" {:3.0f} %  {}/s  {} left", share * 100, shownSize(static_cast<std::uint64_t>(rate)),
                   rate > 0 ? shownDuration(left) : "?");

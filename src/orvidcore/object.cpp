@@ -76,7 +76,7 @@ Result<Done> Object::fill(SavedFile& file, const Progress& progress, Timeout tim
     }
   }
   Result<Done> result = Done();
-  const auto read = stream(
+  auto read = stream(
       file.size(),
       [&](std::span<const std::byte> piece) {
         result = file.append(piece);

@@ -49,14 +49,15 @@ std::mutex registering;
 std::uintptr_t pageSize = 0;
 struct sigaction previous {};
 
-/// Puts zero pages under the rest of the mapping in which `address` lies; false when there is none.
-bool replaceRest(std::uintptr_t address) {
+/// Puts zero pages under the rest of the mapping in which `fault` lies; false when there is none.
+bool replaceRest(void* fault) {
+  const auto address = reinterpret_cast<std::uintptr_t>(fault);
   for (Range& range : ranges) {
     const std::uintptr_t end = range.endOfRangeWith(address);
     if (end == 0) continue;
-    const std::uintptr_t page = address - address % pageSize;
+    const std::uintptr_t intoPage = address % pageSize;
     range.faulted = true;
-    return ::mmap(reinterpret_cast<void*>(page), end - page, PROT_READ,
+    return ::mmap(static_cast<std::byte*>(fault) - intoPage, end - address + intoPage, PROT_READ,
                   MAP_FIXED | MAP_PRIVATE | MAP_ANONYMOUS | MAP_NORESERVE, -1, 0) != MAP_FAILED;
   }
   return false;
@@ -65,8 +66,7 @@ bool replaceRest(std::uintptr_t address) {
 void onBusError(int signal, siginfo_t* info, void*) {
   const int savedErrno = errno;
   // Not ours: it faults again on return, and then meets whoever was here before.
-  if (info->si_code != BUS_ADRERR || !replaceRest(reinterpret_cast<std::uintptr_t>(info->si_addr)))
-    ::sigaction(signal, &previous, nullptr);
+  if (info->si_code != BUS_ADRERR || !replaceRest(info->si_addr)) ::sigaction(signal, &previous, nullptr);
   errno = savedErrno;
 }
 

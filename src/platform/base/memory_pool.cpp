@@ -2,8 +2,6 @@
 #include "platform/base/memory_pool.h"
 
 #include <fcntl.h>
-#include <sys/mman.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -11,9 +9,7 @@
 #include <string>
 #include <utility>
 
-#ifndef F_SEAL_FUTURE_WRITE
-#define F_SEAL_FUTURE_WRITE 0x0010
-#endif
+#include "platform/base/memfd.h"
 
 namespace brivo {
 
@@ -92,13 +88,12 @@ void MemoryPool::giveBack(std::unique_ptr<Memory> memory) {
 }
 
 std::unique_ptr<MemoryPool::Memory> MemoryPool::makeMemory(const char* name, std::size_t size) {
-  UniqueFd fd(::memfd_create(name, MFD_CLOEXEC | MFD_ALLOW_SEALING));
-  if (!fd || ::ftruncate(fd.get(), static_cast<off_t>(size)) != 0) return nullptr;
+  UniqueFd fd = makeMemfd(name, size);
+  if (!fd) return nullptr;
   // What memfd_create() opens is not counted among the writers, and then no lease is granted.
   if (UniqueFd counted = reopened(fd, O_RDWR)) fd = std::move(counted);
   Mapping mapping = Mapping::sharedWritable(fd.get(), size);
-  constexpr int seals = F_SEAL_SHRINK | F_SEAL_GROW | F_SEAL_FUTURE_WRITE | F_SEAL_SEAL;
-  if (!mapping || ::fcntl(fd.get(), F_ADD_SEALS, seals) != 0) return nullptr;
+  if (!mapping || !sealForReaders(fd.get())) return nullptr;
   // Somebody who opens the file at the moment of isOursAlone() breaks the lease: a signal that ends nobody.
   ::fcntl(fd.get(), F_SETSIG, SIGURG);
   return std::make_unique<Memory>(Memory{std::move(fd), std::move(mapping)});

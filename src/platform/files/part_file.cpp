@@ -90,16 +90,9 @@ std::optional<SystemError> PartFile::setTimes(FileTime time) {
 }
 
 Result<std::size_t> PartFile::read(std::span<std::byte> buffer, std::uint64_t offset) const {
-  std::size_t total = 0;
-  while (total < buffer.size()) {
-    const auto rest = buffer.subspan(total);
-    const ssize_t count = ::pread(fd_.get(), rest.data(), rest.size(), static_cast<off_t>(offset + total));
-    if (count < 0 && errno == EINTR) continue;
-    if (count < 0) return error("read");
-    if (count == 0) break;
-    total += static_cast<std::size_t>(count);
-  }
-  return total;
+  const std::int64_t count = systemFiles().read(fd_.get(), buffer, offset);
+  if (count < 0) return error("read");
+  return static_cast<std::size_t>(count);
 }
 
 std::optional<SystemError> PartFile::publish(const std::string& path) {

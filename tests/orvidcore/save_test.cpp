@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 
 #include <filesystem>
+#include <fstream>
 
 #include "orvidcore/client_test.h"
 #include "support/file_size_limit.h"
@@ -275,6 +276,25 @@ TEST_F(SaveTest, AFileThatShrinksDuringASaveIsAnErrorAndNothingIsLeft) {
   });
   EXPECT_FALSE(saving.ok());
   EXPECT_THAT(saved(), IsEmpty());
+}
+
+TEST_F(SaveTest, AStreamGoesOnBehindAPieceThatCameShort) {
+  const std::string content = pattern(kNineMegabytes);
+  const Object object = onlyFile(content);
+  const std::string path = service.card("CARD") + "/DCIM/100ABCDE/IMG_0001.JPG";
+  constexpr std::size_t kEnd = 3'000'000;
+  fs::resize_file(path, kEnd);
+  std::string streamed;
+  const auto result = object.stream(0, [&](std::span<const std::byte> piece) {
+    streamed.append(reinterpret_cast<const char*>(piece.data()), piece.size());
+    if (streamed.size() == kEnd) {  // the rest is there again
+      std::fstream file(path, std::ios::in | std::ios::out | std::ios::binary);
+      file.seekp(kEnd).write(content.data() + kEnd, static_cast<std::streamsize>(content.size() - kEnd));
+    }
+    return true;
+  });
+  EXPECT_TRUE(result.ok());
+  EXPECT_TRUE(streamed == content);
 }
 
 TEST_F(SaveTest, WithoutMemoryToLendTheServiceReadsAhead) {

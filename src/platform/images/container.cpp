@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: MIT
+#include "platform/images/container.h"
+
+#include <algorithm>
+#include <array>
+
+#include "platform/images/jpeg.h"
+
+namespace brivo::images {
+
+namespace {
+
+/// Reads if the bytes are in its container; false, with nothing found, when they are not.
+using Reader = bool (*)(Parse&);
+
+constexpr std::array<Reader, 1> kReaders{readJpegFile};
+
+}  // namespace
+
+bool readContainer(Parse& parse) {
+  return std::ranges::any_of(kReaders, [&](Reader reader) { return reader(parse); });
+}
+
+}  // namespace brivo::images

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "ptp/object_info_dataset.h"
 
+#include <array>
 #include <vector>
 
 #include "platform/base/byte_cursor.h"
@@ -70,10 +71,10 @@ Data MSObjectInfoDataset::content() const {
   WriteUInt16(cursor, protectionStatus_);
   WriteUInt64(cursor, objectCompressedSize_);
   WriteUInt16(cursor, thumbFormat_);
-  for (const std::uint32_t field : {thumbCompressedSize_, thumbOffset_, thumbPixWidth_, thumbPixHeight_,
-                                    imagePixWidth_, imagePixHeight_, imageBitDepth_, parentObject_}) {
-    WriteUInt32(cursor, field);
-  }
+  const std::array<std::uint32_t, 8> fields{thumbCompressedSize_, thumbOffset_,   thumbPixWidth_,
+                                            thumbPixHeight_,      imagePixWidth_, imagePixHeight_,
+                                            imageBitDepth_,       parentObject_};
+  for (const std::uint32_t field : fields) WriteUInt32(cursor, field);
   WriteUInt16(cursor, associationType_);
   WriteUInt16(cursor, imageOrietation_);
   WriteUInt64(cursor, captureDate_tvsec_);

@@ -6,12 +6,13 @@
 #include <string>
 
 #include "platform/base/data.h"
+#include "platform/base/relaxed.h"
 
 namespace brivo {
 
 /// The record that describes one object of a card to clients: this system's variant of the
 /// ObjectInfo dataset of ISO 15740 (clause 5.5.2). Numbers are 0 and the name is empty until set.
-/// *Thread-bound.*
+/// *Thread-bound*, but that one thread may set what is said of the image and its thumbnail while others read.
 ///
 /// Serialised form, little-endian, in this order: objectHandle 4, content length 4, objectFormat 2,
 /// protectionStatus 2, objectCompressedSize 8, thumbFormat 2, thumbCompressedSize 4, thumbOffset 4,
@@ -101,19 +102,19 @@ class MSObjectInfoDataset {
   std::uint64_t modificationDate_tvsec_ = 0;
   std::string filename_;
   std::uint32_t objectHandle_ = 0;
-  std::uint32_t thumbCompressedSize_ = 0;
-  std::uint32_t thumbOffset_ = 0;
-  std::uint32_t thumbPixWidth_ = 0;
-  std::uint32_t thumbPixHeight_ = 0;
-  std::uint32_t imagePixWidth_ = 0;
-  std::uint32_t imagePixHeight_ = 0;
+  Relaxed<std::uint32_t> thumbCompressedSize_;
+  Relaxed<std::uint32_t> thumbOffset_;
+  Relaxed<std::uint32_t> thumbPixWidth_;
+  Relaxed<std::uint32_t> thumbPixHeight_;
+  Relaxed<std::uint32_t> imagePixWidth_;
+  Relaxed<std::uint32_t> imagePixHeight_;
   std::uint32_t imageBitDepth_ = 0;
   std::uint32_t parentObject_ = 0;
   std::uint16_t objectFormat_ = 0;
   std::uint16_t protectionStatus_ = 0;
   std::uint16_t thumbFormat_ = 0;
   std::uint16_t associationType_ = 0;
-  std::uint16_t imageOrietation_ = 0;
+  Relaxed<std::uint16_t> imageOrietation_;
 };
 
 }  // namespace brivo

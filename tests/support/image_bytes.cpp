@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-#include "tiff_bytes.h"
+#include "support/image_bytes.h"
 
 #include <algorithm>
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "platform/images/exif_entries.h"
 
+#include <algorithm>
 #include <bit>
 #include <charconv>
 #include <string>
@@ -14,7 +15,6 @@ namespace brivo::images {
 namespace {
 
 constexpr std::size_t kHeaderBytes = 6;
-constexpr std::size_t kMostElements = 4096;
 
 /// Bytes whose order depends on the byte order, which is half an element of a rational.
 std::size_t unitOf(TiffType type) {
@@ -100,8 +100,6 @@ struct ExifEntries::Entry {
   std::span<const std::byte> value;
 };
 
-/// An entry is packed as its group, its type, its tag and the length of its value (two bytes each for the
-/// last two), and its value; everything in little-endian order.
 void ExifEntries::add(ExifGroup group, std::uint16_t tag, std::uint16_t type,
                       std::span<const std::byte> value, std::endian order) {
   const std::size_t unit = unitOf(TiffType{type});
@@ -110,21 +108,24 @@ void ExifEntries::add(ExifGroup group, std::uint16_t tag, std::uint16_t type,
       value.size() <= kLongestValue && packed_.size() + kHeaderBytes + value.size() <= kMostBytes;
   if (!hasName || !fits || unit == 0 || value.empty()) return;
   if (packed_.empty()) packed_.reserve(1024);
-  const auto append = [&](std::size_t byte) { packed_.push_back(static_cast<std::byte>(byte & 0xFF)); };
-  append(static_cast<std::size_t>(group));
-  append(type);
-  append(tag);
-  append(tag >> 8);
-  append(value.size());
-  append(value.size() >> 8);
-  if (order == std::endian::little || unit == 1) {
-    packed_.insert(packed_.end(), value.begin(), value.end());
-    return;
-  }
-  for (std::size_t at = 0; at + unit <= value.size(); at += unit) {
-    const auto element = value.subspan(at, unit);
-    packed_.insert(packed_.end(), element.rbegin(), element.rend());
-  }
+  append({group, TiffType{type}, tag, value});
+  if (order == std::endian::little || unit == 1) return;
+  const auto packed = std::span(packed_).last(value.size());
+  for (std::size_t at = 0; at + unit <= packed.size(); at += unit)
+    std::ranges::reverse(packed.subspan(at, unit));
+}
+
+/// An entry is packed as its group, its type, its tag and the length of its value (two bytes each for the
+/// last two), and its value; everything in little-endian order.
+void ExifEntries::append(const Entry& entry) {
+  const auto byte = [&](std::size_t value) { packed_.push_back(static_cast<std::byte>(value & 0xFF)); };
+  byte(static_cast<std::size_t>(entry.group));
+  byte(static_cast<std::size_t>(entry.type));
+  byte(entry.tag);
+  byte(entry.tag >> 8);
+  byte(entry.value.size());
+  byte(entry.value.size() >> 8);
+  packed_.insert(packed_.end(), entry.value.begin(), entry.value.end());
 }
 
 template <class Visit>
@@ -168,6 +169,16 @@ Dictionary ExifEntries::dictionary(ExifGroup group) const {
     return false;
   });
   return dictionary;
+}
+
+ExifEntries ExifEntries::selected(bool (*keep)(ExifGroup group, std::uint16_t tag)) const {
+  ExifEntries kept;
+  kept.packed_.reserve(packed_.size());
+  visitEntries([&](const Entry& entry) {
+    if (keep(entry.group, entry.tag)) kept.append(entry);
+    return false;
+  });
+  return kept;
 }
 
 }  // namespace brivo::images

@@ -44,11 +44,15 @@ class ExifEntries {
   /// All of a group by name.
   Dictionary dictionary(ExifGroup group) const;
 
+  /// Only the entries that `keep` gives true for, of which it is told group and tag.
+  ExifEntries selected(bool (*keep)(ExifGroup group, std::uint16_t tag)) const;
+
   /// The entries as bytes, for packed storage.
   std::span<const std::byte> packed() const { return packed_; }
 
  private:
   struct Entry;
+  void append(const Entry& entry);
   /// Calls `visit` with each entry until it gives true.
   template <class Visit>
   void visitEntries(Visit visit) const;

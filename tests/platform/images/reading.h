@@ -8,7 +8,7 @@
 #include <string_view>
 
 #include "platform/images/image_reader.h"
-#include "tiff_bytes.h"
+#include "support/image_bytes.h"
 
 namespace brivo::images {
 

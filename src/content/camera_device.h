@@ -14,6 +14,7 @@
 namespace brivo {
 
 class BrivoItem;
+class MetadataArchive;
 
 /// Owned by the device's side; items know it by this alone, and do not own it. *Thread-safe.*
 class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
@@ -33,6 +34,9 @@ class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
   virtual void addCameraFolderToIndex(const std::shared_ptr<BrivoItem>& item) = 0;
   /// Sends serialised datasets to all clients as one content batch.
   virtual void flushNotifications(Array datasets) = 0;
+
+  /// Where the metadata of the device's pictures are kept.
+  virtual MetadataArchive& metadataArchive() = 0;
 
   /// A queue of its own for work on one of the device's files.
   virtual std::shared_ptr<SerialQueue> makeSerialQueue() = 0;

@@ -104,6 +104,7 @@ class BrivoDevice final : public CameraDevice,
     index_.addCameraFolderToIndex(item);
   }
   void flushNotifications(Array datasets) override { notifications_.flushNotifications(std::move(datasets)); }
+  MetadataArchive& metadataArchive() override { return metadataArchive_; }
   std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(services_.pool); }
   void addInitiatedOperation(Task operation) override;
   void enumerateConcurrently(Task step) override;
@@ -142,6 +143,7 @@ class BrivoDevice final : public CameraDevice,
   std::vector<std::string> mediaPaths_ BRIVO_GUARDED_BY(propertiesLock_);
 
   CatalogueCounters counters_;
+  MetadataArchive metadataArchive_;
   ObjectIndex index_{counters_};
   const std::shared_ptr<OVClientManager> clientManager_;
   DeviceNotifications notifications_;

@@ -18,7 +18,7 @@ class RecordingDevice : public CameraDevice {
  public:
   std::string name() const override { return "CARD"; }
   bool isLocked() const override { return locked; }
-  bool prioritizeSpeed() const override { return false; }
+  bool prioritizeSpeed() const override { return speedFirst; }
   bool beingEjected() const override { return ejected; }
   FileSystem& files() const override { return *fileSystem; }
 
@@ -34,8 +34,9 @@ class RecordingDevice : public CameraDevice {
     const std::lock_guard lock(mutex);
     batches.push_back(std::move(datasets));
   }
+  MetadataArchive& metadataArchive() override { return archive; }
   std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(pool); }
-  void addInitiatedOperation(Task operation) override { operation(); }
+  void addInitiatedOperation(Task operation) override { operations.push_back(std::move(operation)); }
   /// Steps run in order on the test's thread, in run().
   void enumerateConcurrently(Task step) override { steps.push_back(std::move(step)); }
   void enumerateWhenClientsKeepUp(Task step) override { steps.push_back(std::move(step)); }
@@ -63,6 +64,7 @@ class RecordingDevice : public CameraDevice {
 
   bool locked = false;
   bool ejected = false;
+  bool speedFirst = false;
   FileSystem* fileSystem = &systemFiles();
   Pool pool;
   std::mutex mutex;
@@ -70,6 +72,9 @@ class RecordingDevice : public CameraDevice {
   std::vector<std::shared_ptr<BrivoFolder>> folders;
   std::vector<Array> batches;
   std::vector<Task> steps;
+  /// What items have asked to be done later.
+  std::vector<Task> operations;
+  MetadataArchive archive;
 };
 
 }  // namespace brivo

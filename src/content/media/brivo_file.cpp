@@ -23,6 +23,7 @@ std::shared_ptr<BrivoFile> BrivoFile::initWithFSURL(std::string path, std::strin
   if (!values) return nullptr;
   std::shared_ptr<BrivoFile> file(new BrivoFile(std::move(path), std::move(name), parent, device, *values));
   file->decideKind();
+  if (file->hasMetadata()) file->readFirstMetadata();
   return file;
 }
 
@@ -52,6 +53,13 @@ void BrivoFile::decideKind() {
   }
   hasMetadata_ = type() == kTypeImage || type() == kTypeMovie;
   setHasThumbnail(hasMetadata_);
+}
+
+/// Raw files take longer than others; where speed is wanted they must not hold up the walk.
+void BrivoFile::readFirstMetadata() {
+  if (!rawImageSupported()) return updateBasicMetadata();
+  if (!device().prioritizeSpeed()) return rawImageMinimumProperties();
+  device().addInitiatedOperation([file = shared_from_this()] { file->rawImageMinimumProperties(); });
 }
 
 void BrivoFile::setHasThumbnail(bool value) {

@@ -7,8 +7,11 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <variant>
 
 #include "content/brivo_item.h"
+#include "content/media/metadata_archive.h"
+#include "content/media/sub_images.h"
 #include "io/buffer_cache.h"
 #include "io/file_stream.h"
 
@@ -26,10 +29,13 @@ inline constexpr std::uint32_t kTypeMovie = fourCharacterCode("moov");
 inline constexpr std::uint32_t kTypeAudio = fourCharacterCode("audo");
 inline constexpr std::uint32_t kTypeOther = fourCharacterCode("othe");
 
-/// A regular file on a volume. Its kind is decided once, from the extension of its name. The stream
-/// operations are *thread-safe*, those of the buffer cache belong to one thread at a time; the rest as in
-/// BrivoItem.
-class BrivoFile final : public BrivoItem, public ReadAheadSource {
+/// A regular file on a volume. Its kind is decided once, from the extension of its name; what a picture says
+/// of itself is read once, when the file is made or, for raw files where speed is wanted, in an operation of
+/// the device. The stream operations are *thread-safe*; everything that reads metadata, and the buffer cache,
+/// belong to the device's operations once the file is made; the rest as in BrivoItem.
+class BrivoFile final : public BrivoItem,
+                        public ReadAheadSource,
+                        public std::enable_shared_from_this<BrivoFile> {
  public:
   /// Makes the item of the file at `path`; null, with no handle taken, when the file system cannot tell its
   /// values. `prefetched` spares asking it.
@@ -80,6 +86,51 @@ class BrivoFile final : public BrivoItem, public ReadAheadSource {
   /// False for the extensions, in any letter case, whose raw files are not taken as such.
   static bool hasValidInformation(std::string_view extension);
 
+  /// Reads what the catalogue shows of the file: for images the size, the orientation, the embedded thumbnail
+  /// and with them the metadata. Once; later calls do nothing. Raw files have rawImageMinimumProperties().
+  void updateBasicMetadata();
+  /// The same for raw files: displayed size, orientation and the embedded previews.
+  void rawImageMinimumProperties();
+  /// True when updateBasicMetadata() has run, and when the metadata dictionary has been built.
+  bool updatedBasicMetadata() const { return updatedBasicMetadata_; }
+  bool updatedExpensiveMetadata() const { return updatedExpensiveMetadata_; }
+
+  /// Runs the basic pass, builds the dictionary unless there is one, and answers with it.
+  void metadataWithOptions(const Dictionary& options, const ResultHandler& reply) override;
+  /// The metadata dictionary, built by the first call; empty when it could not be. None when there never was
+  /// one to build.
+  std::optional<Dictionary> metadataDict();
+  /// What is kept of it already.
+  std::optional<Dictionary> metadata() const;
+  /// Fills the dictionary and the dataset from the properties of an image; false when they give no usable
+  /// metadata. `hasExif`: they count as EXIF.
+  bool processMetadata(const std::optional<images::ImageProperties>& properties, bool hasExif);
+  /// Sets orientation, width and height from a dictionary of image properties. For images on their side the
+  /// dataset and the dictionary get the size as it is shown.
+  void setSizeAndOrientationFromImageProperties(Dictionary& properties);
+
+  // Dates of the picture as EXIF has them, and in seconds since 1970; none before the metadata have been
+  // read.
+  std::optional<std::string> exifCreationDateTime() const;
+  std::optional<std::string> exifModificationDateTime() const;
+  std::optional<std::int64_t> exifCreationDate() const;
+  std::optional<std::int64_t> exifModificationDate() const;
+
+  /// Finished JPEGs in the file, by width.
+  const SubImages& subImages() const { return subImages_; }
+  /// As validatedSubImage(), and notes what kind of image was found: a width of 160 pixels is the thumbnail
+  /// that the dataset tells of.
+  std::optional<SubImage> rawImageValidateSubImage(const SubImage* description, Error* error = nullptr);
+  /// Adds a validated description unless there is one of its width.
+  void addSubImageDict(const SubImage& image);
+  /// The narrowest image of at least that width; none when all are narrower.
+  std::optional<SubImage> subImageDictForPixelWidth(std::uint32_t width) const;
+  /// A small embedded image has been found, and a large one.
+  bool smallThumbnail() const { return smallThumbnail_; }
+  bool previewThumbnail() const { return previewThumbnail_; }
+  /// Orders items by handle: -1, 0 or 1. The context is not used.
+  static int compare(const BrivoItem& item, const BrivoItem& against, const void* context);
+
   /// True for a read that gave as many bytes as were asked for, neither 0 nor the failure marker.
   static bool validateReturnDataSize(std::int64_t returned, std::int64_t requested);
 
@@ -108,12 +159,38 @@ class BrivoFile final : public BrivoItem, public ReadAheadSource {
  private:
   using BrivoItem::BrivoItem;
   void decideKind();
+  void readFirstMetadata();
+  void readCheapProperties(std::string_view extension);
+  void readMovieProperties();
+  void buildImageMetadata();
+  bool keepMetadata(const images::ImageProperties& properties);
+  std::optional<std::uint32_t> orientationFrom(const images::ImageProperties& properties);
+  void setEmbeddedThumbnail(const images::EmbeddedImage& thumbnail);
+  void readRawProperties(const Dictionary& raw, Dictionary& properties);
+  std::optional<ImageMetadata> imageMetadata() const;
 
   FileStream stream_;
   std::string_view Tevo_;
+  SubImages subImages_;
+  /// None, a picture's, or any other.
+  std::variant<std::monostate, ArchivedMetadata, Dictionary> metadata_;
   bool hasThumbnail_ = false;
   bool hasMetadata_ = false;
+  bool updatedBasicMetadata_ = false;
+  bool updatedExpensiveMetadata_ = false;
+  bool smallThumbnail_ = false;
+  bool previewThumbnail_ = false;
   std::unique_ptr<OVBufferCache> bufferCache_;  // last: it reads from the stream
 };
+
+/// Orientation, width and height at the top of a dictionary of image properties: 1 when no orientation is
+/// there; none for a size that is not there. The size of a raw image's sensor comes before that of the
+/// picture.
+struct ImageDimensions {
+  std::int64_t orientation = 1;
+  std::optional<std::uint64_t> width;
+  std::optional<std::uint64_t> height;
+};
+ImageDimensions OVGetDimensionsFromImageProperties(const Dictionary& properties);
 
 }  // namespace brivo

@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <unordered_map>
+#include <vector>
+
+#include "content/media/image_metadata.h"
+#include "platform/base/mutex.h"
+
+namespace brivo {
+
+/// The metadata of one picture in little memory: what differs from that of a picture like it. Move-only.
+/// *Immutable.*
+class ArchivedMetadata {
+ public:
+  /// As it was archived.
+  ImageMetadata restored() const;
+
+ private:
+  friend class MetadataArchive;
+  using Bytes = std::shared_ptr<const std::vector<std::byte>>;
+
+  Bytes model_;
+  std::unique_ptr<std::byte[]> changes_;
+  std::uint32_t changesLength_ = 0;
+};
+
+/// Archives the metadata of a card's pictures. Most pictures of a card come from one camera, so their
+/// metadata have the same entries in the same places and differ in a few bytes: an archived one holds those
+/// alone and shares the rest with a model. *Thread-safe.*
+class MetadataArchive {
+ public:
+  /// Of the maker note only entry "17" is kept, and no GPS entry; embedded images other than the thumbnail,
+  /// and the crop size, are not kept.
+  ArchivedMetadata archive(const ImageMetadata& metadata) BRIVO_EXCLUDES(lock_);
+
+ private:
+  using Bytes = ArchivedMetadata::Bytes;
+  /// Models of this many bytes, the latest last.
+  using Models = std::vector<Bytes>;
+
+  Models& modelsOfLength(std::size_t length) BRIVO_REQUIRES(lock_);
+
+  Mutex lock_;
+  std::unordered_map<std::size_t, Models> models_ BRIVO_GUARDED_BY(lock_);
+};
+
+}  // namespace brivo

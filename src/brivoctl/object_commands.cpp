@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-// ls, read, get, rm
+// ls, info, read, rm
 #include <fmt/core.h>
 #include <unistd.h>
 
@@ -11,14 +11,42 @@
 #include "brivoctl/command.h"
 #include "brivoctl/output.h"
 #include "brivoctl/selection.h"
+#include "brivoctl/value_json.h"
 #include "platform/base/base64.h"
 
 namespace brivoctl {
 
 namespace {
 
-ExitCode list(const CommonOptions& common, const std::string& selector) {
-  const auto selected = openDevice(common, selector);
+struct ListOptions {
+  std::string device;
+  bool longForm = false;
+};
+
+std::string shownPixels(std::uint32_t width, std::uint32_t height) {
+  return width == 0 || height == 0 ? "-" : fmt::format("{}x{}", width, height);
+}
+
+/// A size that is only the mark of a thumbnail is not known.
+std::string shownThumbnail(const orvid::ObjectInfo& info) {
+  constexpr std::uint32_t kMark = 1;
+  if (info.thumbSize == 0) return "-";
+  if (info.thumbSize == kMark) return "decoded";
+  return fmt::format("{} @{}", shownPixels(info.thumbWidth, info.thumbHeight), info.thumbOffset);
+}
+
+std::string shownObject(const orvid::ObjectInfo& info, bool longForm) {
+  std::string line = fmt::format("{:>8}  {:>10}  {}", info.handle, info.isFolder ? "-" : shownSize(info.size),
+                                 shownTime(info.captured));
+  if (longForm) {
+    line += fmt::format("  {:>11}  {:>1}  {:>16}", shownPixels(info.width, info.height),
+                        info.orientation == 0 ? "-" : std::to_string(info.orientation), shownThumbnail(info));
+  }
+  return line + "  " + shown(info.path) + (info.isFolder ? "/" : "");
+}
+
+ExitCode list(const CommonOptions& common, const ListOptions& options) {
+  const auto selected = openDevice(common, options.device);
   if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
   const auto catalogue = std::get<0>(selected).device->catalogue(common.wait());
   if (!catalogue.ok()) return report(catalogue.error());
@@ -28,10 +56,23 @@ ExitCode list(const CommonOptions& common, const std::string& selector) {
     printJson(objects);
     return kSuccess;
   }
-  for (const auto& object : *catalogue) {
-    const orvid::ObjectInfo& info = object.info();
-    printLine(fmt::format("{:>8}  {:>10}  {}  {}{}", info.handle, info.isFolder ? "-" : shownSize(info.size),
-                          shownTime(info.captured), shown(info.path), info.isFolder ? "/" : ""));
+  for (const auto& object : *catalogue) printLine(shownObject(object.info(), options.longForm));
+  return kSuccess;
+}
+
+ExitCode info(const CommonOptions& common, const std::vector<std::string>& arguments) {
+  const auto selected = openObjects(common, arguments);
+  if (const auto* code = std::get_if<ExitCode>(&selected)) return *code;
+  const auto& objects = std::get<0>(selected).objects;
+  if (objects.size() != 1) return fail("info takes one object", kUsage);
+  const auto metadata = objects.front().metadata(common.wait());
+  if (!metadata.ok()) return report(metadata.error());
+  if (common.json) {
+    printJson(jsonOf(*metadata));
+  } else if (metadata->empty()) {
+    fmt::print(stderr, "brivoctl: {} has no metadata\n", shown(objects.front().info().path));
+  } else {
+    fmt::print("{}", linesOf(*metadata));
   }
   return kSuccess;
 }
@@ -93,9 +134,17 @@ void addObjectCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode)
     return addServiceCommand(app, common, name, text);
   };
   CLI::App* ls = add("ls", "List the objects of a device");
-  const auto device = std::make_shared<std::string>();
-  ls->add_option("DEVICE", *device, "Which device");
-  ls->callback([&common, &exitCode, device] { exitCode = list(common, *device); });
+  const auto listOptions = std::make_shared<ListOptions>();
+  ls->add_option("DEVICE", listOptions->device, "Which device");
+  ls->add_flag(
+      "-l,--long", listOptions->longForm,
+      "Show pixels, EXIF orientation and embedded thumbnail (its size and where in the file it begins)");
+  ls->callback([&common, &exitCode, listOptions] { exitCode = list(common, *listOptions); });
+
+  CLI::App* describing = add("info", "Show the metadata of an object");
+  const auto described = std::make_shared<std::vector<std::string>>();
+  describing->add_option("OBJECT", *described, "[DEVICE] OBJECT")->required()->expected(1, 2);
+  describing->callback([&common, &exitCode, described] { exitCode = info(common, *described); });
 
   CLI::App* reading = add("read", "Write bytes of an object to standard output");
   const auto readOptions = std::make_shared<ReadOptions>();

@@ -1,8 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "brivoctl/record_json.h"
 
-#include <fmt/format.h>
-
+#include "brivoctl/hexadecimal.h"
 #include "ptp/code_names.h"
 
 namespace brivoctl {
@@ -11,13 +10,6 @@ namespace {
 
 using brivo::MSObjectInfoDataset;
 using brivo::PTPContainer;
-
-std::string hexOf(std::span<const std::byte> bytes) {
-  std::string text;
-  text.reserve(2 * bytes.size());
-  for (const std::byte byte : bytes) fmt::format_to(std::back_inserter(text), "{:02x}", byte);
-  return text;
-}
 
 std::string nameOfCode(const PTPContainer& container) {
   switch (container.codeKind) {

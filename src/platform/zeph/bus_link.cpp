@@ -150,6 +150,9 @@ void BusLink::setReading(bool reading) {
 
 void BusLink::turn() {
   if (ended_) return;
+  // Until the peer has taken the rest of a message nothing else may be written, an answer of sd-bus's own
+  // neither.
+  if (batch_.isInsideMessage() && !writeBatch()) return rearm();
   // While reading is off, sd-bus is only asked to write; it may still take in a message now and
   // then.
   int result = reading_ || queuedInBus() > 0 ? 1 : 0;
@@ -194,13 +197,33 @@ bool BusLink::peerIsSilent() const {
   return sd_bus_is_ready(bus_) <= 0 || queuedInBus() >= kMostInBus;
 }
 
+bool BusLink::batch(const Outgoing& next) {
+  const auto* signal = std::get_if<OutgoingSignal>(&next.message);
+  // Behind what sd-bus still has to write, order is kept by leaving this to it as well.
+  if (!signal || next.weight >= kDescriptorThreshold || queuedInBus() > 0) return false;
+  return batch_.append(*signal, remote_.protocol().interface, next.weight);
+}
+
+bool BusLink::writeBatch() {
+  const SignalBatch::Written written = batch_.writeTo(sd_bus_get_fd(bus_));
+  const SignalBatch::Left left = batch_.takeLeft();
+  if (left.messages > 0) owner_.left(left.messages, left.weight);
+  if (written == SignalBatch::Written::hungUp) end("");
+  return written == SignalBatch::Written::all;
+}
+
 void BusLink::refill() {
   if (ended_) return;
   settleSent();
   for (int i = 0; i < kMessagesPerTurn; ++i) {
-    if (peerIsSilent()) return;  // continues when the socket takes more
+    if (peerIsSilent() || (batch_.isFull() && !writeBatch())) return;  // continues when the socket takes more
     if (toPut_.empty()) toPut_ = owner_.takeOutgoing(kMessagesPerTurn);
-    if (toPut_.empty()) return;
+    if (toPut_.empty()) return (void)writeBatch();
+    if (batch(toPut_.front())) {
+      toPut_.pop_front();
+      continue;
+    }
+    if (!writeBatch()) return;
     Outgoing next = std::move(toPut_.front());
     toPut_.pop_front();
     const int result = std::visit([&](auto& message) { return put(message); }, next.message);
@@ -208,7 +231,7 @@ void BusLink::refill() {
     settleSent();
     if (result == -ECONNRESET || result == -ENOTCONN || result == -EPIPE) return end("");
   }
-  sd_event_source_set_enabled(again_, SD_EVENT_ONESHOT);  // others first
+  if (writeBatch()) sd_event_source_set_enabled(again_, SD_EVENT_ONESHOT);  // others first
 }
 
 void BusLink::giveUpLateCalls() {
@@ -246,8 +269,10 @@ void BusLink::rearm() {
   if (ended_) return;
   const int events = sd_bus_get_events(bus_);
   if (events >= 0) {
-    const auto wanted = static_cast<std::uint32_t>(events);
-    sd_event_source_set_io_events(io_, reading_ ? wanted : wanted & ~std::uint32_t{EPOLLIN});
+    auto wanted = static_cast<std::uint32_t>(events);
+    if (!reading_ || batch_.isInsideMessage()) wanted &= ~std::uint32_t{EPOLLIN};
+    if (!batch_.empty()) wanted |= EPOLLOUT;
+    sd_event_source_set_io_events(io_, wanted);
   }
   std::uint64_t due = UINT64_MAX;
   if (reading_) (void)sd_bus_get_timeout(bus_, &due);

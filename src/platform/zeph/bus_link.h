@@ -15,6 +15,7 @@
 #include "platform/base/unique_fd.h"
 #include "platform/zeph/outgoing.h"
 #include "platform/zeph/protocol.h"
+#include "platform/zeph/signal_batch.h"
 
 namespace brivo::zeph {
 
@@ -37,7 +38,8 @@ class LinkOwner {
 };
 
 /// Owns the socket, reads and checks messages, and feeds sd-bus no faster than the socket takes
-/// them, so that what waits can be counted. *Thread-bound* to the I/O thread.
+/// them, so that what waits can be counted. Small signals go past sd-bus, many with one system call.
+/// *Thread-bound* to the I/O thread.
 class BusLink {
  public:
   enum class Role { service, client };
@@ -81,6 +83,10 @@ class BusLink {
   std::uint64_t firstDeadline() const;
 
   int put(const OutgoingSignal& signal);
+  /// Takes a small signal into the batch; false for any other message, which sd-bus has to send.
+  bool batch(const Outgoing& next);
+  /// Writes the batch as far as the socket takes it; false when something of it still waits.
+  bool writeBatch();
   int put(OutgoingAnswer& answer);
   int put(OutgoingCall& call);
   void settleSent();
@@ -112,6 +118,7 @@ class BusLink {
   std::map<std::uint64_t, CallToAnswer> callsToAnswer_;
   std::map<PendingCall*, std::unique_ptr<PendingCall>> callsToHear_;
   std::deque<Outgoing> toPut_;
+  SignalBatch batch_;
   std::deque<std::size_t> weightsInBus_;  // of messages that sd-bus has not written yet, oldest first
 };
 

@@ -140,6 +140,33 @@ TEST_F(EchoTest, ACallWithoutAnAnswerTimesOut) {
   EXPECT_EQ(answer.error().name, kErrorNoReply);
 }
 
+TEST_F(EchoTest, EveryKindOfValueArrivesInASignalAndLargeOnesKeepTheirPlace) {
+  const auto collector = std::make_shared<SignalCollector>();
+  const auto client = connectClient(collector);
+  ASSERT_TRUE(echo(client, {}).ok());
+  const Dictionary small{{"flag", true},
+                         {"i", std::int32_t{-21450}},
+                         {"x", std::numeric_limits<std::int64_t>::min()},
+                         {"t", std::numeric_limits<std::uint64_t>::max()},
+                         {"d", 0.1},
+                         {"text", "\xC3\xA4"},
+                         {"bytes", Data::copyOf("abc")},
+                         {"strings", Array{"a", "b"}},
+                         {"datas", Array{Data::copyOf("x"), Data::copyOf("")}},
+                         {"none", Array(Array::Kind::data)},
+                         {"mixed", Array{"a", 1, Dictionary{{"k", false}}}},
+                         {"nested", Dictionary{{"in", Dictionary{{"deeper", 1}}}}}};
+  const Dictionary large{{"bytes", Data(std::vector<std::byte>(200'000, std::byte{7}))}};
+  const auto proxy = service->connection()->remoteObjectProxyWithErrorHandler(nullptr);
+  constexpr std::size_t kCount = 300;
+  const auto sent = [&](std::size_t i) { return i % 10 == 9 ? large : small; };
+  for (std::size_t i = 0; i < kCount; ++i)
+    proxy.send("event:", std::make_shared<const Arguments>(Arguments{sent(i)}));
+  ASSERT_TRUE(waitUntil([&] { return collector->count() == kCount; }));
+  for (std::size_t i = 0; i < kCount; ++i)
+    EXPECT_EQ(*collector->received[i].second.get<Dictionary>(), sent(i)) << i;
+}
+
 TEST_F(EchoTest, SignalsArriveInOrderFromOneThread) {
   const auto collector = std::make_shared<SignalCollector>();
   const auto client = connectClient(collector);

@@ -20,6 +20,7 @@ constexpr std::size_t kFillBytes = 16;
 using namespace std::string_view_literals;
 constexpr std::string_view kExifSignature = "Exif\0"sv;  // a NUL or 0xFF follows
 constexpr std::string_view kMultiPictureSignature = "MPF\0"sv;
+constexpr std::string_view kFlashPixSignature = "FPXR\0"sv;
 constexpr std::string_view kJfifExtensionSignature = "JFXX\0\x10"sv;
 
 constexpr std::uint16_t kMultiPictureEntries = 0xB002;
@@ -32,8 +33,8 @@ struct Segment {
   std::uint64_t length = 0;
 };
 
-/// T.81 B.1.1.3: markers that stand alone.
-bool isWithoutParameters(std::uint8_t marker) { return marker == 0x01 || (marker >= 0xD0 && marker <= 0xD8); }
+/// T.81 B.1.1.3: markers that stand alone, and the zero that makes an 0xFF plain data.
+bool isWithoutParameters(std::uint8_t marker) { return marker <= 0x01 || (marker >= 0xD0 && marker <= 0xD8); }
 /// The end of the image, or the start of a scan, behind which there are only entropy-coded data.
 bool endsHeaders(std::uint8_t marker) { return marker == 0xD9 || marker == 0xDA; }
 /// SOF0 to SOF15 without DHT, JPG and DAC.
@@ -52,7 +53,11 @@ class Segments {
     while (parse_.spendDirectory() && next_ < end_) {
       const auto head = parse_.ranges.upTo(next_, kFillBytes);
       ByteCursor cursor(head, std::endian::big);
-      if (cursor.u8() != 0xFF) return std::nullopt;
+      if (cursor.u8() != 0xFF) {  // decoders skip what is no marker, and so do we
+        next_ += static_cast<std::size_t>(std::ranges::find(head, std::byte{0xFF}) - head.begin());
+        if (head.empty()) return std::nullopt;
+        continue;
+      }
       std::uint8_t marker = cursor.u8();
       while (marker == 0xFF && cursor.remaining() > 2) marker = cursor.u8();  // fill bytes
       next_ += cursor.position();
@@ -83,16 +88,23 @@ bool startsWith(Parse& parse, const Segment& segment, std::string_view signature
 struct Frame {
   PixelSize size;
   std::uint16_t depth = 0;
+  std::uint8_t components = 0;
 };
 
-/// T.81 B.2.2: sample precision, lines, samples per line.
+/// T.81 B.2.2: sample precision, lines, samples per line, components.
 Frame frameOf(Parse& parse, const Segment& segment) {
-  ByteCursor cursor(parse.ranges.bytes(segment.start, 5), std::endian::big);
+  ByteCursor cursor(parse.ranges.bytes(segment.start, 6), std::endian::big);
   Frame frame;
   frame.depth = cursor.u8();
   frame.size.height = cursor.u16();
   frame.size.width = cursor.u16();
+  frame.components = cursor.u8();
   return cursor.ok() ? frame : Frame();
+}
+
+/// SOF0 to SOF2 with the components of grey or of Y′CbCr; not a frame that could not be read.
+bool isForViewers(const Segment& segment, const Frame& frame) {
+  return segment.marker <= 0xC2 && frame.depth == 8 && (frame.components == 1 || frame.components == 3);
 }
 
 bool isJpeg(Parse& parse, std::uint64_t offset, std::uint64_t length) {
@@ -127,9 +139,21 @@ void readMultiPictureSegment(Parse& parse, const Segment& segment) {
   }
 }
 
+/// EXIF 2.32 annex B: a FlashPix stream may end with a JPEG. One that goes on in another segment is not in
+/// one run, and of no use.
+void readFlashPixSegment(Parse& parse, const Segment& segment) {
+  const auto bytes = parse.ranges.bytes(segment.start, static_cast<std::size_t>(segment.length));
+  const std::string_view text(reinterpret_cast<const char*>(bytes.data()), bytes.size());
+  const std::size_t image = text.find("\xFF\xD8\xFF");
+  if (image != text.npos && text.ends_with("\xFF\xD9"))
+    addEmbeddedJpeg(parse, segment.start + image, segment.length - image);
+}
+
 void readPreviewSegment(Parse& parse, const Segment& segment) {
   if (segment.marker == kApp2 && startsWith(parse, segment, kMultiPictureSignature)) {
     readMultiPictureSegment(parse, segment);
+  } else if (segment.marker == kApp2 && startsWith(parse, segment, kFlashPixSignature)) {
+    readFlashPixSegment(parse, segment);
   } else if (segment.marker == kApp0 && startsWith(parse, segment, kJfifExtensionSignature)) {
     const std::size_t before = kJfifExtensionSignature.size();
     addEmbeddedJpeg(parse, segment.start + before, segment.length - before);
@@ -170,21 +194,26 @@ EmbeddedImage jpegAt(Parse& parse, std::uint64_t offset, std::uint64_t length) {
   Segments segments(parse, offset, length);
   while (const auto segment = segments.next()) {
     if (!isFrameHeader(segment->marker)) continue;
-    image.size = frameOf(parse, *segment).size;
+    const Frame frame = frameOf(parse, *segment);
+    if (frame.size && !isForViewers(*segment, frame)) return {};
+    image.size = frame.size;
     break;
   }
   return image;
 }
 
-void addEmbeddedJpeg(Parse& parse, std::uint64_t offset, std::uint64_t length, PixelSize stated) {
+void addEmbeddedJpeg(Parse& parse, std::uint64_t offset, std::uint64_t length, PixelSize stated,
+                     std::uint16_t orientation) {
   auto& embedded = parse.found.embedded;
   constexpr std::size_t kMostImages = 64;
   if (embedded.size() == kMostImages ||
       std::ranges::find(embedded, offset, &EmbeddedImage::offset) != embedded.end())
     return;
   EmbeddedImage image = jpegAt(parse, offset, length);
+  if (!image) return;
   setOnce(image.size, stated);
-  if (image) embedded.push_back(image);
+  image.orientation = orientation;
+  embedded.push_back(image);
 }
 
 }  // namespace brivo::images

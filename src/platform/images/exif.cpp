@@ -6,6 +6,7 @@
 #include "platform/base/byte_cursor.h"
 #include "platform/images/exif_names.h"
 #include "platform/images/jpeg.h"
+#include "platform/images/maker_previews.h"
 
 namespace brivo::images {
 
@@ -43,6 +44,7 @@ void readExif(TiffBlock& block) {
   const TiffDirectory main = block.directory(block.firstDirectory());
   readMainDirectory(block, main);
   if (main.next != 0) readThumbnail(block, block.directory(main.next));
+  if (block.parse().scope == Scope::previews) readMakerPreviews(block, main);
 }
 
 void readMainDirectory(TiffBlock& block, const TiffDirectory& directory) {
@@ -64,11 +66,37 @@ void readExifDirectory(TiffBlock& block, const TiffDirectory& directory) {
 }
 
 void readThumbnail(TiffBlock& block, const TiffDirectory& directory) {
+  Parse& parse = block.parse();
   const auto offset = block.number(directory, tag::kJpegOffset);
   const auto length = block.number(directory, tag::kJpegLength);
   if (!offset || !length || *offset > block.length()) return;
-  if (const EmbeddedImage image = jpegAt(block.parse(), block.start() + *offset, *length))
-    block.parse().found.thumbnail = image;
+  if (const EmbeddedImage image = jpegAt(parse, block.start() + *offset, *length))
+    parse.found.thumbnail = image;
+  if (parse.scope == Scope::previews) addNamedJpeg(block, directory, tag::kJpegOffset, tag::kJpegLength);
+}
+
+void readMakerPreviews(TiffBlock& block, const TiffDirectory& main) {
+  const TiffDirectory exif = namedDirectory(block, main, tag::kExifDirectory);
+  const TiffEntry* note = exif.find(tag::kMakerNote);
+  const TiffEntry* make = main.find(tag::kMake);
+  if (!note) return;
+  readMakerPreviews(block.parse(), {block.start() + note->position, note->length, block.start(),
+                                    make ? block.text(*make) : std::string_view()});
+}
+
+PixelSize statedSize(const TiffBlock& block, const TiffDirectory& directory) {
+  return pixelSize(block.number(directory, tag::kImageWidth).value_or(0),
+                   block.number(directory, tag::kImageLength).value_or(0));
+}
+
+void addNamedJpeg(const TiffBlock& block, const TiffDirectory& directory, std::uint16_t offsetTag,
+                  std::uint16_t lengthTag) {
+  const auto offset = block.number(directory, offsetTag);
+  const auto length = block.number(directory, lengthTag);
+  const std::uint64_t orientation = block.number(directory, tag::kOrientation).value_or(0);
+  if (!offset || !length || *offset > block.length()) return;
+  addEmbeddedJpeg(block.parse(), block.start() + *offset, *length, statedSize(block, directory),
+                  isOrientation(orientation) ? static_cast<std::uint16_t>(orientation) : std::uint16_t{0});
 }
 
 void readMakerNoteDictionary(Parse& parse, std::uint64_t start, std::uint64_t length) {

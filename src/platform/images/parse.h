@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <limits>
 
 #include "platform/images/image_properties.h"
 #include "platform/images/ranges.h"
@@ -47,6 +48,13 @@ void setOnce(Number& number, Other value) {
 }
 inline void setOnce(PixelSize& size, PixelSize value) {
   if (!size) size = value;
+}
+
+/// Empty where a side is more than any image has.
+constexpr PixelSize pixelSize(std::uint64_t width, std::uint64_t height) {
+  constexpr std::uint64_t kMost = std::numeric_limits<std::uint32_t>::max();
+  if (width > kMost || height > kMost) return {};
+  return {static_cast<std::uint32_t>(width), static_cast<std::uint32_t>(height)};
 }
 
 /// True for the eight values that EXIF 2.32 defines (tag 0x0112).

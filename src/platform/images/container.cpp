@@ -5,6 +5,7 @@
 #include <array>
 
 #include "platform/images/jpeg.h"
+#include "platform/images/tiff.h"
 
 namespace brivo::images {
 
@@ -13,7 +14,7 @@ namespace {
 /// Reads if the bytes are in its container; false, with nothing found, when they are not.
 using Reader = bool (*)(Parse&);
 
-constexpr std::array<Reader, 1> kReaders{readJpegFile};
+constexpr std::array<Reader, 2> kReaders{readJpegFile, readTiffFile};
 
 }  // namespace
 

@@ -71,7 +71,7 @@ void readSizes(TiffBlock& block, std::span<const TiffDirectory> directories, boo
   const TiffDirectory& main = mainOf(block, directories);
   found.size = imageOnSensor(block, directories.front());
   setOnce(found.size, statedSize(block, main));
-  found.depth = static_cast<std::uint16_t>(block.number(main, tag::kBitsPerSample).value_or(0));
+  found.depth = sampleBits(block, main);
   if (!isRaw) return;
   found.crop = defaultCrop(block, main);
   setOnce(found.crop, found.size);

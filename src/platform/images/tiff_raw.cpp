@@ -24,6 +24,7 @@ constexpr std::uint16_t kTopBorder = 0x0004;
 constexpr std::uint16_t kLeftBorder = 0x0005;
 constexpr std::uint16_t kBottomBorder = 0x0006;
 constexpr std::uint16_t kRightBorder = 0x0007;
+constexpr std::uint16_t kPanasonicBits = 0x000A;
 constexpr std::uint16_t kJpegFromRaw = 0x002E;
 
 /// The directory of Sony's own tags, and in it Minolta's blocks, which Sony's first cameras still wrote.
@@ -88,6 +89,12 @@ bool isRawFile(const TiffBlock& block, std::span<const TiffDirectory> directorie
 
 PixelSize imageOnSensor(TiffBlock& block, const TiffDirectory& first) {
   return block.magic() == kPanasonicMagic ? betweenBorders(block, first) : minoltaSize(block, first);
+}
+
+std::uint16_t sampleBits(const TiffBlock& block, const TiffDirectory& directory) {
+  const bool isPanasonic = block.magic() == kPanasonicMagic;
+  const auto bits = block.number(directory, isPanasonic ? kPanasonicBits : tag::kBitsPerSample);
+  return static_cast<std::uint16_t>(bits.value_or(0));
 }
 
 PixelSize defaultCrop(const TiffBlock& block, const TiffDirectory& directory) {

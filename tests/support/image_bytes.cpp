@@ -61,10 +61,9 @@ void TiffBytes::rationals(std::uint16_t tag,
   raw(tag, kRational, values.size(), value);
 }
 
-void TiffBytes::directory(std::uint16_t tag, std::size_t to) {
-  const bool big = big_;
-  raw(tag, big ? kLong8 : kLong, 1, {});
-  directories_.back().fields.back().target = to + 1;
+void TiffBytes::directories(std::uint16_t tag, std::initializer_list<std::size_t> to) {
+  raw(tag, big_ ? kLong8 : kLong, to.size(), {});
+  directories_.back().fields.back().targets = to;
 }
 
 void TiffBytes::offsetOf(std::uint16_t tag, std::string content) {
@@ -101,9 +100,8 @@ std::string TiffBytes::build(std::uint16_t magic, std::size_t gap) const {
     for (const Field& field : directory.fields) {
       directories += number(field.tag, 2) + number(field.type, 2) + number(field.count, offsetBytes);
       const std::size_t width = field.type == kLong8 ? 8 : 4;
-      std::string value = field.target != 0 ? number(places[field.target - 1], width)
-                          : field.placed    ? number(end + values.size(), width)
-                                            : field.value;
+      std::string value = field.placed ? number(end + values.size(), width) : field.value;
+      for (const std::size_t target : field.targets) value += number(places[target], width);
       if (field.placed) values += field.value;
       if (value.size() > offsetBytes) {
         const std::string offset = number(end + values.size(), offsetBytes);

@@ -34,7 +34,9 @@ class TiffBytes {
   void longs(std::uint16_t tag, std::initializer_list<std::uint64_t> values);
   void rationals(std::uint16_t tag, std::initializer_list<std::pair<std::uint32_t, std::uint32_t>> values);
   /// Names the directory with number `to`, which may be begun later.
-  void directory(std::uint16_t tag, std::size_t to);
+  void directory(std::uint16_t tag, std::size_t to) { directories(tag, {to}); }
+  /// Names several.
+  void directories(std::uint16_t tag, std::initializer_list<std::size_t> to);
   /// The offset of `content`, which lies behind the directories, as a LONG.
   void offsetOf(std::uint16_t tag, std::string content);
   /// The same, with its length under `lengthTag`.
@@ -50,8 +52,8 @@ class TiffBytes {
     std::uint16_t type;
     std::uint64_t count;
     std::string value;
-    std::size_t target = 0;  ///< number of a directory, from 1 on
-    bool placed = false;     ///< the value is content whose offset is the field's value
+    std::vector<std::size_t> targets{};  ///< directories whose offsets are the value
+    bool placed = false;                 ///< the value is content whose offset is the field's value
   };
   struct Directory {
     std::vector<Field> fields;

@@ -111,6 +111,59 @@ TEST(Jpeg, TheOtherPicturesOfAMultiPictureFileAreEmbedded) {
   EXPECT_EQ(found->embedded[0].size, (PixelSize{1620, 1080}));
 }
 
+TEST(Jpeg, TheThumbnailIsAnEmbeddedImageToo) {
+  const std::string file = jpeg(4000, 3000, exifSegment(exifWithThumbnail(std::endian::little)));
+  const auto found = readPreviews(file);
+  ASSERT_EQ(found->embedded.size(), 1u);
+  EXPECT_EQ(found->embedded[0].offset, found->thumbnail.offset);
+  EXPECT_EQ(found->embedded[0].size, (PixelSize{160, 120}));
+  EXPECT_TRUE(readBasics(file)->embedded.empty());
+}
+
+TEST(Jpeg, AFlashPixStreamMayEndWithAPreview) {
+  const std::string preview = jpeg(288, 192);
+  const std::string stream = std::string("FPXR\0\0\2\0\1", 9) + "properties";
+  const auto found = readPreviews(jpeg(10, 20, jpegSegment(0xE2, stream + preview)));
+  ASSERT_EQ(found->embedded.size(), 1u);
+  EXPECT_EQ(found->embedded[0].size, (PixelSize{288, 192}));
+  EXPECT_EQ(found->embedded[0].length, preview.size());
+  const std::string continued = preview.substr(0, preview.size() - 1);
+  EXPECT_TRUE(readPreviews(jpeg(10, 20, jpegSegment(0xE2, stream + continued)))->embedded.empty());
+}
+
+TEST(Jpeg, AThumbnailThatFewViewersShowIsNone) {
+  const auto hasThumbnail = [](const std::string& thumbnail) {
+    TiffBytes tiff;
+    tiff.beginDirectory();
+    tiff.shorts(0x0112, {1});
+    tiff.link(0, tiff.beginDirectory());
+    tiff.placed(0x0201, 0x0202, thumbnail);
+    return bool(readBasics(jpeg(10, 20, exifSegment(tiff.build())))->thumbnail);
+  };
+  const auto changed = [](std::size_t place, char byte) {
+    std::string thumbnail = jpeg(160, 120);
+    thumbnail[place] = byte;
+    return thumbnail;
+  };
+  EXPECT_TRUE(hasThumbnail(jpeg(160, 120)));
+  EXPECT_TRUE(hasThumbnail(changed(3, '\xC2'))) << "progressive";
+  EXPECT_TRUE(hasThumbnail(changed(11, 1))) << "grey";
+  EXPECT_FALSE(hasThumbnail(changed(3, '\xC3'))) << "lossless";
+  EXPECT_FALSE(hasThumbnail(changed(3, '\xC9'))) << "arithmetic coding";
+  EXPECT_FALSE(hasThumbnail(changed(6, 12))) << "12 bits";
+  EXPECT_FALSE(hasThumbnail(changed(11, 2))) << "two components";
+}
+
+TEST(Jpeg, JunkBetweenSegmentsIsSkipped) {
+  const std::string comment = jpegSegment(0xFE, "comment");
+  EXPECT_EQ(readBasics(jpeg(10, 20, comment + std::string("hello\xFF\0 there", 12)))->size,
+            (PixelSize{10, 20}));
+  EXPECT_EQ(readBasics(jpeg(10, 20, comment + std::string(2000, 'x')))->size, (PixelSize{10, 20}));
+  CountingSource source("\xFF\xD8" + std::string(1'000'000, 'x'));
+  EXPECT_FALSE(copySequentialProperties(source)->size);
+  EXPECT_EQ(source.reads(), 1u);
+}
+
 TEST(Jpeg, SixteenKibibytesAreEnoughForAPictureWithItsThumbnail) {
   CountingSource source(jpeg(4000, 3000, exifSegment(exifWithThumbnail(std::endian::little))) +
                         std::string(1'000'000, 'x'));

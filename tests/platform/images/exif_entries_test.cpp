@@ -6,7 +6,7 @@
 #include <cmath>
 
 #include "platform/images/exif_names.h"
-#include "tiff_bytes.h"
+#include "support/image_bytes.h"
 
 namespace brivo::images {
 namespace {

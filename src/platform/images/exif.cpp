@@ -56,13 +56,17 @@ void readMainDirectory(TiffBlock& block, const TiffDirectory& directory) {
   readExifDirectory(block, namedDirectory(block, directory, tag::kExifDirectory));
   keepMainEntries(block, directory);
   if (parse.scope == Scope::all)
-    keepEntries(block, namedDirectory(block, directory, tag::kGpsDirectory), ExifGroup::gps);
+    readGpsDirectory(block, namedDirectory(block, directory, tag::kGpsDirectory));
 }
 
 void readExifDirectory(TiffBlock& block, const TiffDirectory& directory) {
   keepEntries(block, directory, ExifGroup::exif);
   if (const TiffEntry* note = directory.find(tag::kMakerNote))
     readMakerNoteDictionary(block.parse(), block.start() + note->position, note->length);
+}
+
+void readGpsDirectory(TiffBlock& block, const TiffDirectory& directory) {
+  keepEntries(block, directory, ExifGroup::gps);
 }
 
 void readThumbnail(TiffBlock& block, const TiffDirectory& directory) {

@@ -36,6 +36,8 @@ void readExif(TiffBlock& block);
 void readMainDirectory(TiffBlock& block, const TiffDirectory& directory);
 /// The entries of an EXIF directory and of its maker note.
 void readExifDirectory(TiffBlock& block, const TiffDirectory& directory);
+/// The entries of a GPS directory.
+void readGpsDirectory(TiffBlock& block, const TiffDirectory& directory);
 /// Keeps the JPEG that `directory` names (tags 0x0201 and 0x0202) as the thumbnail, if there is one there; in
 /// search of previews it is one of them too.
 void readThumbnail(TiffBlock& block, const TiffDirectory& directory);

@@ -23,9 +23,9 @@ class Parse {
  public:
   Parse(const ByteSource& source, Scope wanted) : ranges(source), scope(wanted) {}
 
-  /// Takes one directory, box or segment from what may be looked at; false when nothing is left.
+  /// Takes one directory or segment from what may be looked at; false when nothing is left.
   bool spendDirectory() { return directoriesLeft_ != 0 && directoriesLeft_-- != 0; }
-  /// Takes `count` entries, or as many as are left; how many that were.
+  /// Takes `count` entries or boxes, or as many as are left; how many that were.
   std::size_t spendEntries(std::uint64_t count) {
     const auto spent = static_cast<std::size_t>(std::min<std::uint64_t>(count, entriesLeft_));
     entriesLeft_ -= spent;

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <array>
 
+#include "platform/images/heif.h"
 #include "platform/images/jpeg.h"
 #include "platform/images/tiff.h"
 
@@ -15,6 +16,7 @@ namespace {
 using Reader = bool (*)(Parse&);
 
 constexpr std::array<Reader, 2> kReaders{readJpegFile, readTiffFile};
+constexpr std::array kReaders{readJpegFile, readHeifFile};
 
 }  // namespace
 

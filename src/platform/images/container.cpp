@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <array>
 
+#include "platform/images/cr3.h"
 #include "platform/images/heif.h"
 #include "platform/images/jpeg.h"
 #include "platform/images/tiff.h"
@@ -17,6 +18,7 @@ using Reader = bool (*)(Parse&);
 
 constexpr std::array<Reader, 2> kReaders{readJpegFile, readTiffFile};
 constexpr std::array kReaders{readJpegFile, readHeifFile};
+constexpr std::array kReaders{readJpegFile, readHeifFile, readCr3File};
 
 }  // namespace
 

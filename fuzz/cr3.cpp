@@ -1,0 +1,14 @@
+// SPDX-License-Identifier: MIT
+#include "platform/images/cr3.h"
+#include "image_check.h"
+
+// A CR3 is read within bounds, and its pictures are shown in the size in which they are stored.
+int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  using namespace brivo::images;
+  checkImage(data, size);
+  const CountingSource source(data, size);
+  Parse parse(source, Scope::all);
+  if (!readCr3File(parse)) check(!parse.found);
+  check(!parse.found.crop || parse.found.crop == parse.found.size);
+  return 0;
+}

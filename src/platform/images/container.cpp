@@ -16,9 +16,7 @@ namespace {
 /// Reads if the bytes are in its container; false, with nothing found, when they are not.
 using Reader = bool (*)(Parse&);
 
-constexpr std::array<Reader, 2> kReaders{readJpegFile, readTiffFile};
-constexpr std::array kReaders{readJpegFile, readHeifFile};
-constexpr std::array kReaders{readJpegFile, readHeifFile, readCr3File};
+constexpr std::array kReaders{readJpegFile, readTiffFile, readHeifFile, readCr3File};
 
 }  // namespace
 

@@ -8,6 +8,8 @@
 #include "platform/images/heif.h"
 #include "platform/images/jpeg.h"
 #include "platform/images/tiff.h"
+#include "platform/images/png.h"
+#include "platform/images/webp.h"
 
 namespace brivo::images {
 
@@ -17,6 +19,7 @@ namespace {
 using Reader = bool (*)(Parse&);
 
 constexpr std::array kReaders{readJpegFile, readTiffFile, readHeifFile, readCr3File};
+constexpr std::array kReaders{readJpegFile, readPng, readWebp};
 
 }  // namespace
 

@@ -1,29 +1,17 @@
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
+#include "exif_bytes.h"
 #include "reading.h"
 
 namespace brivo::images {
 namespace {
 
 using test::exifSegment;
+using test::exifWithThumbnail;
 using test::jpeg;
 using test::jpegSegment;
 using test::TiffBytes;
-
-/// EXIF with a camera, an orientation and a thumbnail of 160 × 120.
-std::string exifWithThumbnail(std::endian order, unsigned orientation = 6) {
-  TiffBytes tiff(order);
-  tiff.beginDirectory();
-  tiff.ascii(0x010F, "Maker");
-  tiff.shorts(0x0112, {orientation});
-  tiff.directory(0x8769, 1);
-  tiff.beginDirectory();
-  tiff.ascii(0x9003, "2021:06:01 10:00:00");
-  tiff.link(0, tiff.beginDirectory());
-  tiff.placed(0x0201, 0x0202, jpeg(160, 120));
-  return tiff.build();
-}
 
 TEST(Jpeg, SizeAndDepthComeFromTheFrameHeader) {
   const auto found = readBasics(jpeg(4000, 3000));

@@ -6,6 +6,8 @@
 
 #include "platform/images/cr3.h"
 #include "platform/images/heif.h"
+#include "platform/images/bmp.h"
+#include "platform/images/gif.h"
 #include "platform/images/jpeg.h"
 #include "platform/images/tiff.h"
 #include "platform/images/png.h"
@@ -20,6 +22,7 @@ using Reader = bool (*)(Parse&);
 
 constexpr std::array kReaders{readJpegFile, readTiffFile, readHeifFile, readCr3File};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp};
+constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp};
 
 }  // namespace
 

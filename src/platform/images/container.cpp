@@ -11,6 +11,7 @@
 #include "platform/images/jpeg.h"
 #include "platform/images/tiff.h"
 #include "platform/images/png.h"
+#include "platform/images/raf.h"
 #include "platform/images/webp.h"
 
 namespace brivo::images {
@@ -23,6 +24,7 @@ using Reader = bool (*)(Parse&);
 constexpr std::array kReaders{readJpegFile, readTiffFile, readHeifFile, readCr3File};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp};
+constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf};
 
 }  // namespace
 

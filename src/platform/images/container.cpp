@@ -7,6 +7,7 @@
 #include "platform/images/cr3.h"
 #include "platform/images/heif.h"
 #include "platform/images/bmp.h"
+#include "platform/images/crw.h"
 #include "platform/images/gif.h"
 #include "platform/images/jpeg.h"
 #include "platform/images/tiff.h"
@@ -25,6 +26,7 @@ constexpr std::array kReaders{readJpegFile, readTiffFile, readHeifFile, readCr3F
 constexpr std::array kReaders{readJpegFile, readPng, readWebp};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf};
+constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf, readCrw};
 
 }  // namespace
 

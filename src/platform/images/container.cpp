@@ -11,6 +11,7 @@
 #include "platform/images/gif.h"
 #include "platform/images/jpeg.h"
 #include "platform/images/tiff.h"
+#include "platform/images/mrw.h"
 #include "platform/images/png.h"
 #include "platform/images/raf.h"
 #include "platform/images/webp.h"
@@ -27,6 +28,7 @@ constexpr std::array kReaders{readJpegFile, readPng, readWebp};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf, readCrw};
+constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf, readCrw, readMrw};
 
 }  // namespace
 

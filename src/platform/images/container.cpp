@@ -15,6 +15,7 @@
 #include "platform/images/png.h"
 #include "platform/images/raf.h"
 #include "platform/images/webp.h"
+#include "platform/images/x3f.h"
 
 namespace brivo::images {
 
@@ -29,6 +30,8 @@ constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp}
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf, readCrw};
 constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp, readRaf, readCrw, readMrw};
+constexpr std::array kReaders{readJpegFile, readPng, readWebp, readGif, readBmp,
+                              readRaf,      readCrw, readMrw,  readX3f};
 
 }  // namespace
 

@@ -5,10 +5,10 @@
 // A CR3 is read within bounds, and its pictures are shown in the size in which they are stored.
 int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   using namespace brivo::images;
-  checkImage(data, size);
+  checkReader(readCr3File, data, size);
   const CountingSource source(data, size);
   Parse parse(source, Scope::all);
-  if (!readCr3File(parse)) check(!parse.found);
+  (void)readCr3File(parse);
   check(!parse.found.crop || parse.found.crop == parse.found.size);
   return 0;
 }

@@ -5,10 +5,10 @@
 // A HEIF is read within bounds; where it has a primary picture with a size, it says how that is shown.
 int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   using namespace brivo::images;
-  checkImage(data, size);
+  checkReader(readHeifFile, data, size);
   const CountingSource source(data, size);
   Parse parse(source, Scope::all);
-  if (!readHeifFile(parse)) check(!parse.found);
+  (void)readHeifFile(parse);
   if (parse.found.depth != 0) check(parse.found.orientation != 0);
   return 0;
 }

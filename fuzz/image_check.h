@@ -1,16 +1,16 @@
 // SPDX-License-Identifier: MIT
+// What holds of whatever an image reader finds, and of what it fetches for that.
 #pragma once
 
 #include <algorithm>
-#include <optional>
 #include <span>
 
 #include "check.h"
-#include "platform/images/image_reader.h"
+#include "platform/images/parse.h"
 
 namespace brivo::images {
 
-/// An image in memory that counts what is fetched of it.
+/// Counts what is fetched of a fuzz input.
 class CountingSource final : public ByteSource {
  public:
   CountingSource(const std::uint8_t* data, std::size_t size)
@@ -18,11 +18,14 @@ class CountingSource final : public ByteSource {
   std::uint64_t size() const override { return memory_.size(); }
   std::size_t read(std::span<std::byte> buffer, std::uint64_t offset) const override {
     ++ranges_;
-    bytes_ += buffer.size();
-    return memory_.read(buffer, offset);
+    const std::size_t count = memory_.read(buffer, offset);
+    bytes_ += count;
+    return count;
   }
-  std::size_t ranges() const { return ranges_; }
-  std::size_t bytes() const { return bytes_; }
+  /// No more was fetched than `limits` and the first range allow.
+  bool keeps(const FetchLimits& limits) const {
+    return ranges_ <= limits.ranges + 1 && bytes_ <= limits.bytes + kFirstRange;
+  }
 
  private:
   const MemorySource memory_;
@@ -30,57 +33,45 @@ class CountingSource final : public ByteSource {
   mutable std::size_t bytes_ = 0;
 };
 
-using ImageReader = std::optional<ImageProperties> (*)(const ByteSource&);
-
-inline void checkLiesWithin(const EmbeddedImage& image, std::uint64_t size) {
-  check(image.offset <= size && image.length <= size - image.offset);
-  check(image.orientation <= 8);
+inline bool isSame(const EmbeddedImage& a, const EmbeddedImage& b) {
+  return a.offset == b.offset && a.length == b.length && a.size == b.size && a.orientation == b.orientation;
 }
 
-inline void checkSame(const ImageProperties& first, const ImageProperties& second) {
-  check(first.size == second.size && first.crop == second.crop);
-  check(first.depth == second.depth && first.orientation == second.orientation);
-  check(std::ranges::equal(first.entries.packed(), second.entries.packed()));
-  check(first.thumbnail.offset == second.thumbnail.offset);
-  check(first.thumbnail.length == second.thumbnail.length);
-  check(std::ranges::equal(first.embedded, second.embedded, {}, &EmbeddedImage::offset,
-                           &EmbeddedImage::offset));
+inline bool isSame(const ImageProperties& a, const ImageProperties& b) {
+  return a.size == b.size && a.depth == b.depth && a.orientation == b.orientation && a.crop == b.crop &&
+         isSame(a.thumbnail, b.thumbnail) && std::ranges::equal(a.entries.packed(), b.entries.packed()) &&
+         std::ranges::equal(a.embedded, b.embedded,
+                            [](const auto& one, const auto& other) { return isSame(one, other); });
 }
 
-/// Most that a parse may fetch: formats whose headers lie in a row have shorter ranges, and more of them.
-inline bool isModest(const CountingSource& source, bool headersInARow) {
-  const std::size_t ranges = headersInARow ? 65 : 5;
-  const std::size_t bytes = headersInARow ? std::size_t{528} * 1024 : std::size_t{256} * 1024;
-  return source.ranges() <= ranges && source.bytes() <= bytes;
+inline void checkFound(const ImageProperties& found, std::uint64_t size) {
+  const auto liesInFile = [size](const EmbeddedImage& image) {
+    return image.offset <= size && image.length <= size - image.offset;
+  };
+  check(found.orientation <= 8);
+  check(liesInFile(found.thumbnail));
+  check(std::ranges::all_of(found.embedded, liesInFile));
+  check(found.entries.packed().size() <= ExifEntries::kMostBytes);
+  check(nestedDictionary(found).contains("Orientation") == (found.orientation != 0));
+  check(flatDictionary(found).contains("ThumbnailOffset") == static_cast<bool>(found.thumbnail));
 }
 
-/// True for what begins as a JPEG or a PNG.
-inline bool hasHeadersInARow(const std::uint8_t* data, std::size_t size) {
-  return size != 0 && (data[0] == 0xFF || data[0] == 0x89);
-}
-
-/// What holds of one call: little is fetched, pictures lie in the file, and a second reading gives the same.
-inline void checkReader(ImageReader reader, const std::uint8_t* data, std::size_t size) {
-  const CountingSource source(data, size);
-  const auto found = reader(source);
-  check(isModest(source, hasHeadersInARow(data, size)));
-  const auto again = reader(CountingSource(data, size));
-  check(found.has_value() == again.has_value());
-  if (!found) return;
-  check(found->orientation <= 8);
-  checkLiesWithin(found->thumbnail, size);
-  for (const EmbeddedImage& image : found->embedded) checkLiesWithin(image, size);
-  checkSame(*found, *again);
-}
-
-/// The same of all calls, and dictionaries say what was found.
-inline void checkImage(const std::uint8_t* data, std::size_t size) {
-  for (const ImageReader reader : {copySequentialProperties, copyImageProperties, copyContainerProperties})
-    checkReader(reader, data, size);
-  const auto found = copyImageProperties(CountingSource(data, size));
-  if (!found) return;
-  check(nestedDictionary(*found).contains("Orientation") == (found->orientation != 0));
-  check(flatDictionary(*found).contains("ThumbnailOffset") == static_cast<bool>(found->thumbnail));
+/// Has `reader` read the input in each scope, twice: what it finds lies in the file and is the same again, it
+/// finds nothing in what is not its kind, and it fetches no more than `limits` and the first range allow.
+inline void checkReader(bool (*reader)(Parse&), const std::uint8_t* data, std::size_t size,
+                        const FetchLimits& limits = kForDirectories) {
+  for (const Scope scope : {Scope::basics, Scope::all, Scope::previews}) {
+    const CountingSource source(data, size);
+    const CountingSource sameSource(data, size);
+    Parse parse(source, scope);
+    Parse sameParse(sameSource, scope);
+    const bool isKnown = reader(parse);
+    check(isKnown == reader(sameParse));
+    check(isSame(parse.found, sameParse.found));
+    check(isKnown || !parse.found);
+    checkFound(parse.found, size);
+    check(source.keeps(limits));
+  }
 }
 
 }  // namespace brivo::images

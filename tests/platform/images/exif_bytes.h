@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "tiff_bytes.h"
+#include "support/image_bytes.h"
 
 namespace brivo::test {
 

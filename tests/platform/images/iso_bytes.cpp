@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "iso_bytes.h"
 
-#include "tiff_bytes.h"
+#include "support/image_bytes.h"
 
 namespace brivo::test {
 

@@ -1,0 +1,10 @@
+// SPDX-License-Identifier: MIT
+#include "platform/images/x3f.h"
+
+#include "image_check.h"
+
+// What is found of a X3F file lies in it, and few ranges are fetched for it.
+int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  brivo::images::checkReader(brivo::images::readX3f, data, size);
+  return 0;
+}

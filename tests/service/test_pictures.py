@@ -14,6 +14,7 @@ from test_brivoctl import BrivoctlTest
 PROJECT = pathlib.Path(__file__).resolve().parents[2]
 CORPUS = pathlib.Path(os.environ.get("BRIVOD_CORPUS", PROJECT.parent / "shared" / "corpus"))
 TURNED = (5, 6, 7, 8)
+PREVIEW_SIZE_EXPECTED = (".raf",)  # exiftool tells the size of the preview, the catalogue that of the picture
 SIZE_UNKNOWN = {
     "jpeg/me-beach.jpg",  # its frame header leaves the height to the end of the scan
     "jpeg/structure/pil-junk_jpeg_header.jpg",  # does not begin as a JPEG
@@ -114,6 +115,19 @@ class CorpusTest(BrivoctlTest):
                 metadata = self.json("info", str(entry["handle"]))
                 self.assertEqual(metadata["{Exif}"]["DateTimeOriginal"], facts["date_time_original"])
                 self.assertEqual(metadata["{TIFF}"]["Model"].rstrip(), facts["model"])
+
+    def test_raw_files_have_a_size_and_an_orientation(self):
+        suffixes = (".cr2", ".nef", ".arw", ".orf", ".rw2", ".raf", ".pef", ".cr3")
+        for path, entry, facts in self.put_on_card(suffixes, ("raw/",)):
+            with self.subTest(path):
+                self.assertEqual(entry["orientation"], facts.get("orientation", 1))
+                self.assertGreater(min(entry["width"], entry["height"]), 0)
+                if path.lower().endswith(PREVIEW_SIZE_EXPECTED):
+                    continue
+                shown = [facts["width"], facts["height"]]
+                if entry["orientation"] in TURNED:
+                    shown.reverse()
+                self.assertEqual([entry["width"], entry["height"]], shown)
 
 
 if __name__ == "__main__":

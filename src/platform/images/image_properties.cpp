@@ -67,9 +67,9 @@ Dictionary containerDictionary(const ImageProperties& properties) {
   Array thumbnails;
   for (const EmbeddedImage& image : properties.embedded) thumbnails.append(descriptionOf(image));
   if (!thumbnails.empty()) raw.set("Thumbnails", std::move(thumbnails));
-  if (properties.crop) {
-    raw.set("CropSize", Dictionary{{"Width", properties.crop.width}, {"Height", properties.crop.height}});
-  }
+  // A file under a raw name may hold any picture; that is shown as large as it is.
+  if (const PixelSize shown = properties.crop ? properties.crop : properties.size)
+    raw.set("CropSize", Dictionary{{"Width", shown.width}, {"Height", shown.height}});
   setKnown(raw, "Orientation", properties.orientation);
   return Dictionary{{"{raw}", std::move(raw)}};
 }

@@ -13,10 +13,7 @@ void readRawPreview(Parse& parse, std::uint64_t offset, std::uint64_t length, Pi
   readJpeg(parse, offset, length);
   parse.found.size = size;
   parse.found.depth = depth;
-  if (parse.scope != Scope::previews) return;
-  addEmbeddedJpeg(parse, offset, length, stated);
-  if (const EmbeddedImage thumbnail = parse.found.thumbnail)
-    addEmbeddedJpeg(parse, thumbnail.offset, thumbnail.length);
+  if (parse.scope == Scope::previews) addEmbeddedJpeg(parse, offset, length, stated);
 }
 
 }  // namespace brivo::images

@@ -53,6 +53,22 @@ std::string picture(const ExifTexts& texts, unsigned width = 4000, unsigned heig
   return jpeg(width, height, exifSegment(exif(texts)));
 }
 
+/// A raw-like TIFF: a full size in the first directory, a preview and a thumbnail.
+std::string rawFile(unsigned orientation) {
+  TiffBytes tiff;
+  tiff.beginDirectory();
+  tiff.longs(0x00FE, {0});
+  tiff.longs(0x0100, {6000});
+  tiff.longs(0x0101, {4000});
+  tiff.shorts(0x0112, {orientation});
+  tiff.directory(0x014A, 1);
+  tiff.beginDirectory();
+  tiff.placed(0x0201, 0x0202, jpeg(1620, 1080));
+  tiff.link(0, tiff.beginDirectory());
+  tiff.placed(0x0201, 0x0202, jpeg(160, 120));
+  return tiff.build();
+}
+
 class FileMetadataTest : public testing::Test {
  protected:
   std::shared_ptr<BrivoFile> make(const std::string& name, const std::string& content) {
@@ -243,6 +259,35 @@ TEST_F(FileMetadataTest, AMovieThatCannotBeReadIsUpright) {
   EXPECT_EQ(file->thumbSize(), 1u);
   EXPECT_TRUE(file->updatedBasicMetadata());
   EXPECT_TRUE(request(*file).empty());
+}
+
+TEST_F(FileMetadataTest, ARawFileHasItsSizeOrientationAndPreviewsWhenItIsMade) {
+  const test::StandardErrorCapture log;
+  const std::string content = rawFile(6);
+  const auto file = make("IMG_0001.NEF", content);
+  EXPECT_NE(log.text().find("------> rawImageMinimumProperties ------>"), std::string::npos);
+  EXPECT_NE(log.text().find("<------ rawImageMinimumProperties <------   ["), std::string::npos);
+  EXPECT_EQ(file->imageWidth(), 4000u);
+  EXPECT_EQ(file->imageHeight(), 6000u);
+  EXPECT_EQ(file->imageOrientation(), 6u);
+  EXPECT_EQ(file->thumbWidth(), 160u);
+  EXPECT_EQ(content.substr(file->thumbOffset(), file->thumbSize()), jpeg(160, 120));
+  ASSERT_EQ(file->subImages().all().size(), 2u);
+  EXPECT_EQ(file->subImages().all()[1].imageType, SubImageType::previewImage);
+  EXPECT_FALSE(file->updatedBasicMetadata()) << "that is for the first request";
+}
+
+TEST_F(FileMetadataTest, WhereSpeedIsWantedARawFileIsReadLater) {
+  device->speedFirst = true;
+  const auto file = make("IMG_0001.NEF", rawFile(1));
+  EXPECT_EQ(file->imageWidth(), 0u);
+  EXPECT_TRUE(file->subImages().all().empty());
+  ASSERT_EQ(device->operations.size(), 1u);
+  device->operations.front()();
+  EXPECT_EQ(file->imageWidth(), 6000u);
+  EXPECT_EQ(file->subImages().all().size(), 2u);
+  make("IMG_0002.JPG", picture({}));
+  EXPECT_EQ(device->operations.size(), 1u) << "other pictures are read at once";
 }
 
 TEST_F(FileMetadataTest, ARawFileThatCannotBeReadIsUprightAndHasNoPreviews) {

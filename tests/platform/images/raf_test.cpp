@@ -69,11 +69,11 @@ TEST(Raf, ThePreviewAndItsThumbnailAreEmbedded) {
   const auto found = readPreviews(file);
   EXPECT_EQ(found->orientation, 6);
   ASSERT_EQ(found->embedded.size(), 2u);
-  EXPECT_EQ(found->embedded[0].offset, kHeader);
-  EXPECT_EQ(found->embedded[0].length, preview().size());
-  EXPECT_EQ(found->embedded[0].size, (PixelSize{1920, 1280}));
-  EXPECT_EQ(found->embedded[1].size, (PixelSize{160, 120}));
-  EXPECT_EQ(file.substr(found->embedded[1].offset, found->embedded[1].length), jpeg(160, 120));
+  EXPECT_EQ(found->embedded[0].size, (PixelSize{160, 120}));
+  EXPECT_EQ(file.substr(found->embedded[0].offset, found->embedded[0].length), jpeg(160, 120));
+  EXPECT_EQ(found->embedded[1].offset, kHeader);
+  EXPECT_EQ(found->embedded[1].length, preview().size());
+  EXPECT_EQ(found->embedded[1].size, (PixelSize{1920, 1280}));
 }
 
 TEST(Raf, AListThatLiesGivesWhatItHas) {
@@ -100,7 +100,7 @@ TEST(Raf, FiveRangesAreEnoughWhereverThingsLie) {
   const auto found = readPreviews(file);
   EXPECT_EQ(found->crop, (PixelSize{6000, 4000}));
   ASSERT_EQ(found->embedded.size(), 2u);
-  EXPECT_EQ(found->embedded[0].size, (PixelSize{1920, 1280}));
+  EXPECT_EQ(found->embedded[1].size, (PixelSize{1920, 1280}));
 }
 
 TEST(Raf, DamagedFilesAreReadSoundly) {

@@ -109,9 +109,9 @@ TEST(X3f, JpegSectionsAndTheExifThumbnailAreEmbedded) {
   EXPECT_EQ(found->orientation, 8);
   ASSERT_EQ(found->embedded.size(), 3u);
   EXPECT_EQ(found->embedded[0].size, (PixelSize{200, 150}));
-  EXPECT_EQ(found->embedded[1].size, (PixelSize{2640, 1760}));
-  EXPECT_EQ(found->embedded[2].size, (PixelSize{160, 120}));
-  EXPECT_EQ(file.substr(found->embedded[1].offset, found->embedded[1].length), previewWithExif());
+  EXPECT_EQ(found->embedded[1].size, (PixelSize{160, 120}));
+  EXPECT_EQ(found->embedded[2].size, (PixelSize{2640, 1760}));
+  EXPECT_EQ(file.substr(found->embedded[2].offset, found->embedded[2].length), previewWithExif());
 }
 
 TEST(X3f, ASizeThatIsOutOfReachIsTheStatedOne) {

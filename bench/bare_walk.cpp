@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <memory>
+#include <span>
 #include <stdexcept>
 #include <vector>
 
@@ -47,6 +48,13 @@ bool askValues(int folder, const char* name, int flags) {
   return ::faccessat(folder, name, W_OK, AT_SYMLINK_NOFOLLOW | flags) == 0;
 }
 
+bool readHead(int folder, const char* name, std::span<char> buffer) {
+  struct statx status {};
+  if (::statx(folder, name, AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT, kWantedValues, &status) != 0) return false;
+  const UniqueFd file(::openat(folder, name, O_RDONLY | O_CLOEXEC));
+  return file && ::pread(file.get(), buffer.data(), buffer.size(), 0) > 0;
+}
+
 /// The paths of the folders in DCIM; `visit` sees each entry.
 template <class Visit>
 std::vector<std::string> foldersOf(const std::string& media, Visit visit) {
@@ -78,6 +86,15 @@ std::size_t walkWithValues(const std::string& card, const std::function<void()>&
       files += askValues(fd, name, 0) ? 1 : 0;
       eachFile();
     });
+  }
+  return files;
+}
+
+std::size_t readHeads(const std::string& card) {
+  std::vector<char> buffer(64 * 1024);
+  std::size_t files = 0;
+  for (const std::string& folder : foldersOf(card + "/DCIM", [](int, const char*) {})) {
+    forEachName(folder, [&](int fd, const char* name) { files += readHead(fd, name, buffer) ? 1 : 0; });
   }
   return files;
 }

@@ -25,4 +25,9 @@ std::size_t countNames(const std::string& card);
 std::size_t walkWithValues(
     const std::string& card, const std::function<void()>& eachFile = [] {});
 
+/// Lists as above, and asks each file for the same values, opens it, reads its first 64 KiB and closes it:
+/// the least that telling what is in pictures can take without knowing where in them it is. The number of
+/// files that could be read. Throws when something cannot be listed.
+std::size_t readHeads(const std::string& card);
+
 }  // namespace brivo::bench

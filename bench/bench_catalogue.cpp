@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-// How long a catalogue takes, how it grows, and what it costs in memory.
+// How long a catalogue takes, how it grows, and what it costs in memory; the same with what is in pictures.
 #include <sys/socket.h>
 
 #include <algorithm>
@@ -9,6 +9,8 @@
 #include "echo_process.h"
 #include "in_process_catalogue.h"
 #include "options.h"
+#include "picture_figures.h"
+#include "raw_figure.h"
 #include "remote_catalogue.h"
 #include "wire_session.h"
 
@@ -181,5 +183,7 @@ int main(int count, char** words) {
   return runBenchmark(count, words, [](const Options& options) {
     compareWithBareWalk(options);
     compareSizes(options);
+    printPictureFigures(options);
+    printRawFigure(options);
   });
 }

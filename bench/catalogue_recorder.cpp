@@ -40,6 +40,16 @@ void CatalogueRecorder::arrived(std::size_t objects) {
   if (missing_ == 0) complete_.notify_all();
 }
 
+void CatalogueRecorder::sizesArrived(std::size_t files) {
+  const std::lock_guard lock(mutex_);
+  filesWithSize_ += files;
+}
+
+std::size_t CatalogueRecorder::filesWithSize() const {
+  const std::lock_guard lock(mutex_);
+  return filesWithSize_;
+}
+
 CatalogueTimes CatalogueRecorder::wait() {
   std::unique_lock lock(mutex_);
   if (!complete_.wait_for(lock, kLongestCatalogue, [this] { return missing_ == 0; })) {

@@ -28,15 +28,19 @@ class CatalogueRecorder {
 
   void ready();
   void fileArrived();
+  /// So many files came with the size of the picture in them.
+  void sizesArrived(std::size_t files);
   void arrived(std::size_t objects);
   /// Waits for the last object. Throws when it has not come within two minutes.
   CatalogueTimes wait();
+  std::size_t filesWithSize() const;
 
  private:
-  std::mutex mutex_;
+  mutable std::mutex mutex_;
   Stopwatch watch_;
   std::condition_variable complete_;
   std::size_t missing_;
+  std::size_t filesWithSize_ = 0;
   CatalogueTimes times_;
 };
 

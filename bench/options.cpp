@@ -15,7 +15,7 @@ namespace {
 constexpr const char* kDiskFolder = "/var/tmp";
 
 [[noreturn]] void showUsage(const char* program) {
-  std::fprintf(stderr, "usage: %s [--quick] [--folder FOLDER]\n", program);
+  std::fprintf(stderr, "usage: %s [--quick] [--folder FOLDER] [--card FOLDER]\n", program);
   std::exit(2);
 }
 
@@ -30,6 +30,8 @@ Options Options::fromCommandLine(int count, char** words) {
       options.quick = true;
     } else if (word == "--folder" && i + 1 < count) {
       ::setenv("TMPDIR", words[++i], 1);
+    } else if (word == "--card" && i + 1 < count) {
+      options.card = words[++i];
     } else {
       showUsage(words[0]);
     }

@@ -9,9 +9,12 @@ namespace brivo::bench {
 struct Options {
   /// Small cards and few repetitions, to try the program out.
   bool quick = false;
+  /// A card with pictures that make_card.py has made, on the file system on which cards are made; empty when
+  /// it is to be made.
+  std::string card;
 
-  /// Reads "[--quick] [--folder FOLDER]"; prints the usage and ends the program for anything else. Cards and
-  /// everything else are made in FOLDER, by default in $TMPDIR, else in /var/tmp.
+  /// Reads "[--quick] [--folder FOLDER] [--card FOLDER]"; prints the usage and ends the program for anything
+  /// else. Cards and everything else are made in FOLDER, by default in $TMPDIR, else in /var/tmp.
   static Options fromCommandLine(int count, char** words);
 
   /// `full`, or `small` when the run is a quick one.

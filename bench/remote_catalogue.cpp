@@ -28,7 +28,8 @@ orvid::DeviceInfo waitForDevice(const orvid::DeviceBrowser& browser, const std::
 
 }  // namespace
 
-RemoteCatalogue::RemoteCatalogue(const Card& card) : card_(card), service_(card.volumes()) {
+RemoteCatalogue::RemoteCatalogue(const Card& card)
+    : card_(card), recorder_(std::make_shared<CatalogueRecorder>(card.objects())), service_(card.volumes()) {
   browser_ = valueOf(orvid::DeviceBrowser::connect(service_.address()));
   device_ = valueOf(browser_->open(waitForDevice(*browser_, card.path())));
   valueOf(device_->start());
@@ -37,18 +38,18 @@ RemoteCatalogue::RemoteCatalogue(const Card& card) : card_(card), service_(card.
 RemoteCatalogue::~RemoteCatalogue() = default;
 
 CatalogueTimes RemoteCatalogue::enumerate() {
-  // Shared with the callbacks, which may still run when this has returned.
-  const auto recorder = std::make_shared<CatalogueRecorder>(card_.objects());
   orvid::DeviceEvents events;
-  events.onReady = [recorder](std::int32_t) { recorder->ready(); };
-  events.onItems = [recorder](const std::vector<orvid::ObjectInfo>& items) {
+  events.onReady = [recorder = recorder_](std::int32_t) { recorder->ready(); };
+  events.onItems = [recorder = recorder_](const std::vector<orvid::ObjectInfo>& items) {
     if (!std::ranges::all_of(items, &orvid::ObjectInfo::isFolder)) recorder->fileArrived();
+    recorder->sizesArrived(static_cast<std::size_t>(
+        std::ranges::count_if(items, [](const orvid::ObjectInfo& item) { return item.width != 0; })));
     recorder->arrived(items.size());
   };
   device_->setEvents(std::move(events));
-  recorder->begin();
+  recorder_->begin();
   device_->enumerateAsync({}, [](const orvid::Result<orvid::Done>&) {});
-  return recorder->wait();
+  return recorder_->wait();
 }
 
 }  // namespace brivo::bench

@@ -21,9 +21,13 @@ class RemoteCatalogue {
   const ServiceProcess& service() const { return service_; }
   /// From the enumerate call to the last object, as the client's callbacks see it.
   CatalogueTimes enumerate();
+  /// Files of the catalogue that came with the size of the picture in them.
+  std::size_t filesWithSize() const { return recorder_->filesWithSize(); }
 
  private:
   const Card& card_;
+  /// Shared with the callbacks, which may still run when enumerate() has returned.
+  const std::shared_ptr<CatalogueRecorder> recorder_;
   const ServiceProcess service_;
   std::shared_ptr<orvid::DeviceBrowser> browser_;
   std::shared_ptr<orvid::Device> device_;

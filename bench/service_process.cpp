@@ -76,14 +76,15 @@ std::size_t ServiceProcess::threadCount() const {
   return static_cast<std::size_t>(std::distance(fs::begin(tasks), fs::end(tasks)));
 }
 
-double ServiceProcess::residentKilobytes() const { return kilobytesOf("VmRSS:"); }
-double ServiceProcess::peakKilobytes() const { return kilobytesOf("VmHWM:"); }
+double ServiceProcess::residentKilobytes() const { return numberIn("status", "VmRSS:"); }
+double ServiceProcess::peakKilobytes() const { return numberIn("status", "VmHWM:"); }
+double ServiceProcess::bytesRead() const { return numberIn("io", "rchar:"); }
 
-double ServiceProcess::kilobytesOf(const std::string& line) const {
-  std::ifstream status("/proc/" + std::to_string(pid_) + "/status");
-  for (std::string word; status >> word;) {
-    double kilobytes = 0;
-    if (word == line && status >> kilobytes) return kilobytes;
+double ServiceProcess::numberIn(const std::string& file, const std::string& word) const {
+  std::ifstream words("/proc/" + std::to_string(pid_) + "/" + file);
+  for (std::string other; words >> other;) {
+    double number = 0;
+    if (other == word && words >> number) return number;
   }
   throw std::runtime_error("brivod has ended: " + log());
 }

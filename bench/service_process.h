@@ -34,6 +34,9 @@ class ServiceProcess {
   double peakKilobytes() const;
   void resetPeak() const;
 
+  /// Bytes that its read calls have got since its start, from files and from everything else.
+  double bytesRead() const;
+
   /// Runs the brivoctl of this build as a client of the service; gives its exit code.
   int brivoctl(const std::vector<std::string>& arguments) const;
   /// What the service and brivoctl have printed.
@@ -41,8 +44,8 @@ class ServiceProcess {
 
  private:
   pid_t start(const std::string& program, const std::vector<std::string>& arguments) const;
-  /// A size in the process's status, by the word before it.
-  double kilobytesOf(const std::string& line) const;
+  /// A number in one of the process's files in /proc, by the word before it.
+  double numberIn(const std::string& file, const std::string& word) const;
 
   const test::TemporaryFolder home_;
   const std::string volumes_;

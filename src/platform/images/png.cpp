@@ -9,6 +9,7 @@
 #include "platform/base/byte_cursor.h"
 #include "platform/images/chunk.h"
 #include "platform/images/exif_chunk.h"
+#include "platform/images/inflate.h"
 
 namespace brivo::images {
 
@@ -99,17 +100,25 @@ bool readProfile(Parse& parse, std::string_view profile) {
   return true;
 }
 
+/// The text behind the keyword of a profile, plain (tEXt) or compressed (zTXt).
 bool readText(Parse& parse, const Chunk& chunk) {
-  const auto keyword = lettersOf(parse.ranges.upTo(
+  const bool isCompressed = chunk.type == "zTXt";
+  if ((chunk.type != "tEXt" && !isCompressed) || chunk.length > kLongestProfile) return false;
+  const auto start = lettersOf(parse.ranges.upTo(
       chunk.start, static_cast<std::size_t>(std::min<std::uint64_t>(chunk.length, kExifProfile.size()))));
-  if ((keyword != kExifProfile && keyword != kApp1Profile) || chunk.length > kLongestProfile) return false;
-  const auto text = lettersOf(parse.ranges.upTo(chunk.start, static_cast<std::size_t>(chunk.length)));
-  return !text.empty() && readProfile(parse, text.substr(keyword.size()));
+  if (start != kExifProfile && start != kApp1Profile) return false;
+  const auto bytes = parse.ranges.upTo(chunk.start, static_cast<std::size_t>(chunk.length));
+  if (bytes.size() <= start.size()) return false;
+  const auto content = bytes.subspan(start.size());
+  if (!isCompressed) return readProfile(parse, lettersOf(content));
+  const auto text =
+      inflated(content.subspan(1), kLongestProfile);  // behind the method, which is always zlib's
+  return readProfile(parse, lettersOf(text));
 }
 
 bool readExifOf(Parse& parse, const Chunk& chunk) {
   if (chunk.type == "eXIf") return readExifChunk(parse, chunk.start, chunk.length);
-  return chunk.type == "tEXt" && readText(parse, chunk);
+  return readText(parse, chunk);
 }
 
 }  // namespace

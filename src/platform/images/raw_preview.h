@@ -7,9 +7,9 @@
 namespace brivo::images {
 
 /// Reads the EXIF of the JPEG in bytes `offset` to `offset` + `length`, but not its size and depth, which are
-/// not those of the raw image. In search of previews the JPEG is an embedded image, as its EXIF thumbnail is; the
-/// JPEG's size is `stated` if its frame header does not give one. No JPEG, or one that leaves the file, gives
-/// nothing.
+/// not those of the raw image. In search of previews the JPEG is an embedded image, as its EXIF thumbnail is;
+/// the JPEG's size is `stated` if its frame header does not give one. No JPEG, or one that leaves the file,
+/// gives nothing.
 void readRawPreview(Parse& parse, std::uint64_t offset, std::uint64_t length, PixelSize stated = {});
 
 }  // namespace brivo::images

@@ -23,6 +23,7 @@ class Comparison {
 
   std::vector<Disagreement> run() {
     compareSizes();
+    acceptOtherThumbnail();
     compareTexts();
     comparePreviews();
     return std::move(found_);
@@ -35,6 +36,12 @@ class Comparison {
     if (!theirs && ours_.sizes.empty()) return;
     found_.push_back(
         {"size", ours_.sizes.empty() ? "" : textOf(ours_.sizes.front()), theirs ? textOf(theirs) : ""});
+  }
+
+  /// A raw file without an EXIF thumbnail has one of its other finished JPEGs for one.
+  void acceptOtherThumbnail() {
+    if (!textIn(theirs_, "thumbnail").empty() || textIn(ours_, "thumbnail").empty()) return;
+    if (agreeOnPreview(ours_.thumbnailOffset)) ours_.texts.erase("thumbnail");
   }
 
   void compareTexts() {
@@ -84,7 +91,8 @@ class Comparison {
     return std::to_string(place->second.length) + " bytes, " + textOf(place->second.size);
   }
 
-  const Facts ours_, theirs_;
+  Facts ours_;
+  Facts theirs_;
   std::vector<Disagreement> found_;
 };
 
@@ -140,8 +148,8 @@ std::vector<Disagreement> compare(const Corpus& corpus, const CorpusFile& file) 
   const auto previews = copyContainerProperties(source);
   if (!basics || !all || !previews) return {{"container", "", std::string(kind)}};
   Facts ours = factsOf(*all, *previews), theirs = factsOf(file.facts, isShownByItems(kind));
-  if (isShownByItems(kind)) {
-    // An item without a turn and one with a turn of nothing are shown alike.
+  if (isShownByItems(kind) || kind == "OtherRaw") {
+    // Where no EXIF states it, none and a turn of nothing are shown alike.
     for (Facts* side : {&ours, &theirs}) {
       if (side->texts["orientation"] == "1") side->texts.erase("orientation");
     }

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
+#include <zlib.h>
 
 #include "exif_bytes.h"
 #include "sound_reading.h"
@@ -38,6 +39,17 @@ std::string profile(std::string_view keyword, std::string_view bytes, std::size_
   return text + '\n';
 }
 
+/// The same with everything behind the keyword in a zlib stream.
+std::string compressedProfile(std::string_view keyword, std::string_view bytes) {
+  const std::string plain = profile(keyword, bytes).substr(keyword.size() + 1);
+  std::string stream(::compressBound(plain.size()), '\0');
+  uLongf length = stream.size();
+  EXPECT_EQ(::compress(reinterpret_cast<Bytef*>(stream.data()), &length,
+                       reinterpret_cast<const Bytef*>(plain.data()), plain.size()),
+            Z_OK);
+  return std::string(keyword) + '\0' + '\0' + stream.substr(0, length);
+}
+
 TEST(Png, SizeAndDepthComeFromTheHeader) {
   const auto found = readBasics(png(header(4000, 3000, 16) + chunk("IDAT", "data")));
   ASSERT_TRUE(found);
@@ -57,6 +69,25 @@ TEST(Png, ExifIsReadBeforeAndBehindTheData) {
     EXPECT_EQ(found->entries.find(ExifGroup::tiff, "Make"), Value("Maker"));
     EXPECT_EQ(file.substr(found->thumbnail.offset, found->thumbnail.length), test::jpeg(160, 120));
   }
+}
+
+TEST(Png, ACompressedProfileGivesItsEntriesAndNoThumbnail) {
+  const std::string text = compressedProfile("Raw profile type exif", exifWithThumbnail(std::endian::little));
+  const auto found = readBasics(png(header(10, 20) + chunk("zTXt", text)));
+  EXPECT_EQ(found->orientation, 6);
+  EXPECT_EQ(found->entries.find(ExifGroup::tiff, "Make"), Value("Maker"));
+  EXPECT_FALSE(found->thumbnail) << "it has no place in the file";
+}
+
+TEST(Png, ACompressedProfileThatIsDamagedOrHasNoEndIsNone) {
+  const std::string whole =
+      compressedProfile("Raw profile type exif", exifWithThumbnail(std::endian::little));
+  for (std::size_t length = 22; length < whole.size(); length += 3) {
+    EXPECT_EQ(readBasics(png(header(10, 20) + chunk("zTXt", whole.substr(0, length))))->orientation, 0)
+        << length;
+  }
+  const std::string bomb = compressedProfile("Raw profile type exif", std::string(10'000'000, '\0'));
+  EXPECT_EQ(readBasics(png(header(10, 20) + chunk("zTXt", bomb)))->orientation, 0);
 }
 
 TEST(Png, ExifMayHaveTheSignatureThatItHasInJpeg) {

@@ -7,7 +7,7 @@
 #include <span>
 #include <vector>
 
-#include "platform/images/tiff_bytes.h"
+#include "support/image_bytes.h"
 #include "support/temporary_folder.h"
 
 namespace brivo::bench {

@@ -34,8 +34,8 @@ void keepMainEntries(const TiffBlock& block, const TiffDirectory& directory) {
 }
 
 TiffDirectory namedDirectory(TiffBlock& block, const TiffDirectory& directory, std::uint16_t tag) {
-  const auto offset = block.number(directory, tag);
-  return offset ? block.directory(*offset) : TiffDirectory();
+  const std::uint64_t offset = block.number(directory, tag).value_or(0);
+  return offset != 0 ? block.directory(offset) : TiffDirectory();
 }
 
 }  // namespace

@@ -19,9 +19,9 @@ using namespace std::string_view_literals;
 /// How a directory names a preview: an element of one entry is its offset, an element of another its length.
 /// An entry that is its own offset holds the preview as its value.
 struct Place {
-  std::uint16_t directory;  ///< tag of the directory that it stands in; 0: the note's own
-  std::uint16_t offset;
-  std::uint16_t length;
+  std::uint16_t directory = 0;  ///< tag of the directory that it stands in; 0: the note's own
+  std::uint16_t offset = 0;
+  std::uint16_t length = 0;
   std::uint8_t offsetIndex = 0;
   std::uint8_t lengthIndex = 0;
 };
@@ -114,7 +114,8 @@ TiffDirectory directoryIn(TiffBlock& block, const TiffDirectory& parent, std::ui
   const TiffEntry* entry = parent.find(tag);
   if (!entry) return {};
   if (entry->type == TiffType::undefined) return block.directory(entry->position);
-  return block.directory(block.number(*entry).value_or(0));
+  const std::uint64_t offset = block.number(*entry).value_or(0);
+  return offset != 0 ? block.directory(offset) : TiffDirectory();
 }
 
 void addPreview(const Directories& directories, const TiffDirectory& directory, const Place& place) {

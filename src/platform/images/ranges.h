@@ -22,10 +22,10 @@ struct FetchLimits {
 /// Bytes of the first range: enough for the headers of most pictures.
 inline constexpr std::size_t kFirstRange = 16'384;
 /// For formats whose headers lie in a row (JPEG, PNG): many short ranges.
-inline constexpr FetchLimits kForHeadersInARow{4096, 64, 512 * 1024};
+inline constexpr FetchLimits kForHeadersInARow{4096, 64, 524'288};
 /// For formats whose directories point all over the file (TIFF, ISO base media): few long ones. What a
 /// directory needs often lies right before it.
-inline constexpr FetchLimits kForDirectories{32 * 1024, 4, 240 * 1024, 4096};
+inline constexpr FetchLimits kForDirectories{32'768, 4, 245'760, 4096};
 
 /// The bytes of an image, fetched in ranges as they are asked for and kept until the parse ends. What lies
 /// outside the file, and what the limits do not allow any more, is not there. *Thread-bound.*

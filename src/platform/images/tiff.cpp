@@ -19,11 +19,12 @@ constexpr std::uint16_t kDngPrivateData = 0xC634;
 /// All directories that the first one leads to: itself, its next one if it names one, its subdirectories,
 /// theirs, and so on. Those that cannot be read, or were before, are empty.
 std::vector<TiffDirectory> readDirectories(TiffBlock& block) {
-  std::vector<TiffDirectory> all;
-  const auto add = [&](std::uint64_t offset) { all.push_back(block.directory(offset)); };
-  add(block.firstDirectory());
+  std::vector<TiffDirectory> all{block.directory(block.firstDirectory())};
+  const auto add = [&](std::uint64_t offset) {
+    if (offset != 0) all.push_back(block.directory(offset));
+  };
   for (std::size_t i = 0; i < all.size(); ++i) {
-    if (all[i].next != 0) add(all[i].next);
+    add(all[i].next);
     const TiffEntry* found = all[i].find(tag::kSubDirectories);
     const TiffEntry inner = found ? *found : TiffEntry();
     const std::size_t count = block.parse().spendEntries(inner.count);
@@ -53,9 +54,9 @@ const TiffDirectory& mainOf(const TiffBlock& block, std::span<const TiffDirector
 /// A picture of 8 bits in one strip with compression 6 or 7 may be a JPEG with all its tables. Canon states
 /// the same compression for its raw data, but no size, or 16 bits.
 bool hasJpegStrip(const TiffBlock& block, const TiffDirectory& directory) {
-  const auto compression = block.number(directory, tag::kCompression);
+  const std::uint64_t compression = block.number(directory, tag::kCompression).value_or(0);
   const TiffEntry* strips = directory.find(tag::kStripOffsets);
-  return (compression == 6U || compression == 7U) && strips && strips->count == 1 &&
+  return (compression == 6 || compression == 7) && strips && strips->count == 1 &&
          statedSize(block, directory) && block.number(directory, tag::kBitsPerSample) == 8U &&
          !isSensorData(block, directory);
 }

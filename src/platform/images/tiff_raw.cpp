@@ -65,7 +65,7 @@ PixelSize minoltaSize(TiffBlock& block, const TiffDirectory& first) {
   if (!model || !place || !block.text(*model).starts_with(kFirstOfSony)) return {};
   TiffEntry offset = *place;  // four bytes that are one number
   offset.type = TiffType::longInteger;
-  const TiffDirectory sony = block.directory(block.number(offset).value_or(0));
+  const TiffDirectory sony = block.directory(block.number(offset).value_or(block.length()));
   const TiffEntry* blocks = sony.find(kMinoltaBlocks);
   if (!blocks) return {};
   ByteCursor cursor(block.bytes(*blocks, kAllBytes), block.order());
@@ -77,7 +77,7 @@ PixelSize minoltaSize(TiffBlock& block, const TiffDirectory& first) {
 }  // namespace
 
 bool isSensorData(const TiffBlock& block, const TiffDirectory& directory) {
-  const auto stated = block.number(directory, tag::kPhotometricInterpretation);
+  const std::uint64_t stated = block.number(directory, tag::kPhotometricInterpretation).value_or(0);
   return stated == kColorFilterArray || stated == kLinearRaw;
 }
 

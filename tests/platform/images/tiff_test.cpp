@@ -195,6 +195,26 @@ TEST(Tiff, DirectoriesInACircleEnd) {
   }
 }
 
+TEST(Tiff, OffsetsOfZeroNameNoDirectory) {
+  // The header, read as a directory, would have so many entries that none were left for others.
+  const std::string behind(100'000, 'x');
+  TiffBytes inner;
+  inner.beginDirectory();
+  inner.longs(0x00FE, {1});
+  inner.raw(0x014A, 4, 2, test::integer(0, 4) + test::integer(8 + 30, 4));
+  inner.beginDirectory();
+  imageOf(inner, 4000, 3000);
+  EXPECT_EQ(readBasics(inner.build() + behind)->size, (PixelSize{4000, 3000}));
+
+  TiffBytes exif;
+  exif.beginDirectory();
+  exif.longs(0x8769, {0});
+  exif.directory(0x8825, 1);
+  exif.beginDirectory();
+  exif.bytes(0x0000, {2, 3, 0, 0});
+  EXPECT_TRUE(readAll(exif.build() + behind)->entries.has(ExifGroup::gps));
+}
+
 TEST(Tiff, SubdirectoriesWithoutNumberAreGivenUp) {
   TiffBytes tiff;
   tiff.beginDirectory();

@@ -6,7 +6,7 @@
 int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   using namespace brivo::images;
   checkReader(readCr3File, data, size);
-  const CountingSource source(data, size);
+  const MemorySource source(std::as_bytes(std::span(data, size)));
   Parse parse(source, Scope::all);
   (void)readCr3File(parse);
   check(!parse.found.crop || parse.found.crop == parse.found.size);

@@ -6,7 +6,7 @@
 int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   using namespace brivo::images;
   checkReader(readHeifFile, data, size);
-  const CountingSource source(data, size);
+  const MemorySource source(std::as_bytes(std::span(data, size)));
   Parse parse(source, Scope::all);
   (void)readHeifFile(parse);
   if (parse.found.depth != 0) check(parse.found.orientation != 0);

@@ -28,7 +28,7 @@ BrivoItem::BrivoItem(std::string path, std::string name, const BrivoItem* parent
 
 BrivoItem::BrivoItem(std::string path, std::string name, const BrivoItem* parent, CameraDevice& device,
                      std::uint64_t size)
-    : device_(device), path_(std::move(path)) {
+    : device_(device), path_(std::move(path), parent ? &parent->path_ : nullptr, name) {
   setFilename(std::move(name));
   setParentObject(parent ? parent->objHandle() : 0);
   setObjectCompressedSize(size);

@@ -8,6 +8,7 @@
 #include <string>
 
 #include "content/camera_device.h"
+#include "content/item_path.h"
 #include "platform/base/value.h"
 #include "platform/files/file_system.h"
 #include "ptp/object_info_dataset.h"
@@ -30,7 +31,7 @@ class BrivoItem {
   std::uint32_t type() const { return type_; }
   const MSObjectInfoDataset& info() const { return info_; }
   /// Absolute, as bytes.
-  const std::string& path() const { return path_; }
+  std::string path() const { return path_.of(filename()); }
   CameraDevice& device() const { return device_; }
 
   // What lives in the dataset.
@@ -82,7 +83,7 @@ class BrivoItem {
 
  private:
   CameraDevice& device_;
-  std::string path_;
+  const ItemPath path_;
   MSObjectInfoDataset info_;
   std::uint32_t type_ = 0;
 };

@@ -8,7 +8,9 @@
 #include "device/catalogue_replay.h"
 #include "platform/base/paths.h"
 #include "platform/base/uuid.h"
+#include "platform/logging/log_burst.h"
 #include "platform/text/unicode.h"
+#include "platform/zeph/send_burst.h"
 #include "protocol/keys.h"
 #include "protocol/selectors.h"
 #include "util/log.h"
@@ -23,6 +25,15 @@ constexpr std::chrono::seconds kPowerAssertionTimeout{120};
 constexpr std::uint64_t kMountedReadOnly = 1;
 
 using Priority = OperationQueue::Priority;
+
+/// A step of a walk sends and logs very much.
+Task inBurst(Task step) {
+  return [step = std::move(step)] {
+    const zeph::SendBurst signals;
+    const LogBurst lines;
+    step();
+  };
+}
 
 }  // namespace
 
@@ -251,7 +262,7 @@ Task BrivoDevice::onOwnLane(std::function<void(BrivoDevice&)> task) {
   };
 }
 
-void BrivoDevice::enumerateConcurrently(Task step) { lane_->post(std::move(step)); }
+void BrivoDevice::enumerateConcurrently(Task step) { lane_->post(inBurst(std::move(step))); }
 
 void BrivoDevice::enumerateWhenClientsKeepUp(Task step) {
   const Connections connections = clientManager_->allClientConnections();
@@ -262,7 +273,7 @@ void BrivoDevice::enumerateWhenClientsKeepUp(Task step) {
   const auto first = std::make_shared<std::atomic_flag>();
   for (const auto& connection : connections) {
     connection->whenNotBacklogged([first, lane = lane_, step] {
-      if (!first->test_and_set()) lane->post(step);
+      if (!first->test_and_set()) lane->post(inBurst(step));
     });
   }
 }

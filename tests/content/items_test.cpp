@@ -197,5 +197,15 @@ TEST(FSCameraItemTest, OfAUrlBothTimesAreTheModificationTimeInWholeSeconds) {
   EXPECT_FALSE(MSFSCameraItem::initWithFSURL(card / "none", systemFiles()));
 }
 
+TEST_F(ItemTest, AFileInAFolderKnowsItsWholePathWhateverItIsCalled) {
+  test::writeFile(card / "IMG_0001.JPG", "");
+  const auto folder = BrivoFolder::initWithFSURL(card.path(), "CARD", nullptr, *device);
+  EXPECT_EQ(folder->path(), card.path());
+  EXPECT_EQ(makeFile("IMG_0001.JPG", folder.get())->path(), card / "IMG_0001.JPG");
+  const auto renamed = BrivoFile::initWithFSURL(card / "IMG_0001.JPG", "OTHER.JPG", folder.get(), *device);
+  EXPECT_EQ(renamed->path(), card / "IMG_0001.JPG") << "not below its name";
+  EXPECT_EQ(renamed->name(), "OTHER.JPG");
+}
+
 }  // namespace
 }  // namespace brivo

@@ -21,9 +21,10 @@ std::shared_ptr<BrivoFile> BrivoFile::initWithFSURL(std::string path, std::strin
                                                     const ResourceValues* prefetched) {
   const auto values = valuesOf(path, device, prefetched);
   if (!values) return nullptr;
-  std::shared_ptr<BrivoFile> file(new BrivoFile(std::move(path), std::move(name), parent, device, *values));
+  const auto file =
+      std::make_shared<BrivoFile>(MakingKey(), std::move(path), std::move(name), parent, device, *values);
   file->decideKind();
-  if (file->hasMetadata()) file->readFirstMetadata();
+  if (file->hasMetadata()) readFirstMetadata(file);
   return file;
 }
 
@@ -32,34 +33,45 @@ std::shared_ptr<BrivoFile> BrivoFile::initForReadingOnlyWithName(std::string nam
   std::string path = parent.path() + name;
   const auto values = device.files().resourceValues(path);
   if (!values.ok()) return nullptr;
-  return std::shared_ptr<BrivoFile>(
-      new BrivoFile(std::move(path), std::move(name), &parent, device, values->size));
+  return std::make_shared<BrivoFile>(MakingKey(), std::move(path), std::move(name), &parent, device,
+                                     values->size);
 }
 
 void BrivoFile::decideKind() {
   const std::string extension = lowerCasedExtension(name());
   if (rawImageSupported() || pixelorSupported()) {
     setType(kTypeImage);
-    Tevo_ = kGenericImageType;
   } else if (isMovieExtension(extension)) {
     setType(kTypeMovie);
-    Tevo_ = kGenericMovieType;
   } else if (isAudioExtension(extension)) {
     setType(kTypeAudio);
-    Tevo_ = kGenericAudioType;
   } else {
     setType(kTypeOther);
-    Tevo_ = kGenericDataType;
   }
   hasMetadata_ = type() == kTypeImage || type() == kTypeMovie;
   setHasThumbnail(hasMetadata_);
 }
 
+std::string_view BrivoFile::Tevo() const {
+  switch (type()) {
+    case kTypeImage:
+      return kGenericImageType;
+    case kTypeMovie:
+      return kGenericMovieType;
+    case kTypeAudio:
+      return kGenericAudioType;
+    case kTypeOther:
+      return kGenericDataType;
+    default:
+      return {};  // only made to be read
+  }
+}
+
 /// Raw files take longer than others; where speed is wanted they must not hold up the walk.
-void BrivoFile::readFirstMetadata() {
-  if (!rawImageSupported()) return updateBasicMetadata();
-  if (!device().prioritizeSpeed()) return rawImageMinimumProperties();
-  device().addInitiatedOperation([file = shared_from_this()] { file->rawImageMinimumProperties(); });
+void BrivoFile::readFirstMetadata(const std::shared_ptr<BrivoFile>& file) {
+  if (!file->rawImageSupported()) return file->updateBasicMetadata();
+  if (!file->device().prioritizeSpeed()) return file->rawImageMinimumProperties();
+  file->device().addInitiatedOperation([file] { file->rawImageMinimumProperties(); });
 }
 
 void BrivoFile::setHasThumbnail(bool value) {

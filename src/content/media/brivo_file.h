@@ -33,10 +33,15 @@ inline constexpr std::uint32_t kTypeOther = fourCharacterCode("othe");
 /// of itself is read once, when the file is made or, for raw files where speed is wanted, in an operation of
 /// the device. The stream operations are *thread-safe*; everything that reads metadata, and the buffer cache,
 /// belong to the device's operations once the file is made; the rest as in BrivoItem.
-class BrivoFile final : public BrivoItem,
-                        public ReadAheadSource,
-                        public std::enable_shared_from_this<BrivoFile> {
+class BrivoFile final : public BrivoItem, public ReadAheadSource {
+  struct MakingKey {};
+
  public:
+  /// Only for the functions below.
+  template <class... Arguments>
+  explicit BrivoFile(MakingKey, Arguments&&... arguments)
+      : BrivoItem(std::forward<Arguments>(arguments)...) {}
+
   /// Makes the item of the file at `path`; null, with no handle taken, when the file system cannot tell its
   /// values. `prefetched` spares asking it.
   static std::shared_ptr<BrivoFile> initWithFSURL(std::string path, std::string name, const BrivoItem* parent,
@@ -57,7 +62,7 @@ class BrivoFile final : public BrivoItem,
   bool hasMetadata() const { return hasMetadata_; }
   void setHasMetadata(bool value) { hasMetadata_ = value; }
   /// Identifier of the generic type class: image, movie, audio or data.
-  std::string_view Tevo() const { return Tevo_; }
+  std::string_view Tevo() const;
 
   // What lives in the dataset. Sizes and positions in bytes, widths and heights in pixels.
   std::uint32_t thumbSize() const { return info().thumbCompressedSize(); }
@@ -157,9 +162,8 @@ class BrivoFile final : public BrivoItem,
   OVBufferCache* bufferCache() const { return bufferCache_.get(); }
 
  private:
-  using BrivoItem::BrivoItem;
   void decideKind();
-  void readFirstMetadata();
+  static void readFirstMetadata(const std::shared_ptr<BrivoFile>& file);
   void readCheapProperties(std::string_view extension);
   void readMovieProperties();
   void buildImageMetadata();
@@ -170,7 +174,6 @@ class BrivoFile final : public BrivoItem,
   std::optional<ImageMetadata> imageMetadata() const;
 
   FileStream stream_;
-  std::string_view Tevo_;
   SubImages subImages_;
   /// None, a picture's, or any other.
   std::variant<std::monostate, ArchivedMetadata, Dictionary> metadata_;

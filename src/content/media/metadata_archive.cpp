@@ -2,6 +2,7 @@
 #include "content/media/metadata_archive.h"
 
 #include <algorithm>
+#include <new>
 
 #include "platform/base/byte_cursor.h"
 
@@ -108,29 +109,40 @@ Record changed(Record model, std::span<const std::byte> changes) {
 
 }  // namespace
 
+/// One piece of memory: this, and the bytes of the changes behind it.
+struct ArchivedMetadata::Difference {
+  Bytes model;
+  std::uint32_t length;
+
+  std::byte* changes() { return reinterpret_cast<std::byte*>(this + 1); }
+};
+
+ArchivedMetadata::ArchivedMetadata(Bytes model, std::span<const std::byte> changes) {
+  void* memory = ::operator new(sizeof(Difference) + changes.size());
+  difference_.reset(new (memory) Difference{std::move(model), static_cast<std::uint32_t>(changes.size())});
+  std::ranges::copy(changes, difference_->changes());
+}
+
+void ArchivedMetadata::Delete::operator()(Difference* difference) const {
+  difference->~Difference();
+  ::operator delete(difference);
+}
+
 ImageMetadata ArchivedMetadata::restored() const {
-  return metadataOf(changed(*model_, {changes_.get(), changesLength_}));
+  return metadataOf(changed(*difference_->model, {difference_->changes(), difference_->length}));
 }
 
 ArchivedMetadata MetadataArchive::archive(const ImageMetadata& metadata) {
   Record record = recordOf(metadata);
-  ArchivedMetadata archived;
   const MutexLock lock(lock_);
   Models& models = modelsOfLength(record.size());
   for (const Bytes& model : models) {
     const Record changes = changesOf(*model, record);
-    if (changes.size() > record.size() / 2) continue;
-    archived.model_ = model;
-    if (changes.empty()) return archived;
-    archived.changesLength_ = static_cast<std::uint32_t>(changes.size());
-    archived.changes_ = std::make_unique_for_overwrite<std::byte[]>(changes.size());
-    std::ranges::copy(changes, archived.changes_.get());
-    return archived;
+    if (changes.size() <= record.size() / 2) return {model, changes};
   }
-  archived.model_ = std::make_shared<const Record>(std::move(record));
   if (models.size() == kMostModelsOfOneLength) models.erase(models.begin());
-  models.push_back(archived.model_);
-  return archived;
+  models.push_back(std::make_shared<const Record>(std::move(record)));
+  return {models.back(), {}};
 }
 
 MetadataArchive::Models& MetadataArchive::modelsOfLength(std::size_t length) {

@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <span>
 #include <unordered_map>
 #include <vector>
 
@@ -22,10 +23,14 @@ class ArchivedMetadata {
  private:
   friend class MetadataArchive;
   using Bytes = std::shared_ptr<const std::vector<std::byte>>;
+  struct Difference;
+  struct Delete {
+    void operator()(Difference* difference) const;
+  };
 
-  Bytes model_;
-  std::unique_ptr<std::byte[]> changes_;
-  std::uint32_t changesLength_ = 0;
+  ArchivedMetadata(Bytes model, std::span<const std::byte> changes);
+
+  std::unique_ptr<Difference, Delete> difference_;
 };
 
 /// Archives the metadata of a card's pictures. Most pictures of a card come from one camera, so their

@@ -25,9 +25,10 @@ std::span<const std::byte> ByteCursor::take(std::size_t count) {
 std::uint64_t ByteCursor::integer(std::size_t width) {
   const auto raw = take(width);
   std::uint64_t value = 0;
-  for (std::size_t i = 0; i < raw.size(); ++i) {
-    const std::size_t index = order_ == std::endian::big ? i : raw.size() - 1 - i;
-    value = value << 8 | std::to_integer<std::uint64_t>(raw[index]);
+  if (order_ == std::endian::big) {
+    for (const std::byte byte : raw) value = value << 8 | std::to_integer<std::uint64_t>(byte);
+  } else {
+    for (std::size_t i = raw.size(); i-- > 0;) value = value << 8 | std::to_integer<std::uint64_t>(raw[i]);
   }
   return value;
 }

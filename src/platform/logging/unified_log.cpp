@@ -13,7 +13,9 @@
 #include <array>
 #include <cstdlib>
 
+#include "platform/logging/log_burst.h"
 #include "platform/logging/log_ring.h"
+#include "platform/logging/standard_error.h"
 #include "platform/text/unicode.h"
 
 namespace brivo {
@@ -73,11 +75,10 @@ void UnifiedLog::writeNow(LogLevel level, std::string_view line) const {
   const int priority = priorityOf(level);
   if (journal_) return writeToJournal(priority, line);
   const std::string text = fmt::format("<{}>{}\n", priority, line);
-  std::string_view rest = text;
-  while (!rest.empty()) {
-    const ssize_t written = ::write(STDERR_FILENO, rest.data(), rest.size());
-    if (written < 0 && errno != EINTR) return;  // nobody to tell
-    if (written > 0) rest.remove_prefix(static_cast<std::size_t>(written));
+  if (LogBurst* burst = LogBurst::ofThisThread()) {
+    burst->add(text, level == LogLevel::error);
+  } else {
+    writeToStandardError(text);
   }
 }
 

@@ -10,8 +10,8 @@ namespace brivo {
 
 enum class LogLevel { debug, standard, error };
 
-/// Writes finished lines. A line costs one system call; it blocks when the reader of standard error
-/// does, except on threads that hold a LogRing. *Thread-safe.*
+/// Writes finished lines. A line costs one system call, except within a LogBurst; it blocks when the reader
+/// of standard error does, except on threads that hold a LogRing. *Thread-safe.*
 class UnifiedLog {
  public:
   /// `subsystem` is a reverse-DNS name, `category` the process's name; both travel as journal

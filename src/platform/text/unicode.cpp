@@ -117,10 +117,15 @@ std::string asciiLowerCased(std::string_view text) {
 }
 
 std::string escapingControls(std::string_view text) {
-  const bool plain = std::ranges::all_of(text, [](char c) { return c >= 0x20 && c < 0x7F; });
-  if (plain) return std::string(text);
+  const auto isPlain = [](char c) { return c >= 0x20 && c < 0x7F; };
   std::string line;
+  line.reserve(text.size());
   for (std::size_t i = 0; i < text.size();) {
+    const auto rest = text.substr(i);
+    const auto plain = static_cast<std::size_t>(std::ranges::find_if_not(rest, isPlain) - rest.begin());
+    line += rest.substr(0, plain);
+    i += plain;
+    if (i == text.size()) break;
     const CodePoint next = codePointAt(text, i);
     if (!next.value) {
       line += kReplacement;

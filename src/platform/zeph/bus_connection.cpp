@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "platform/zeph/send_burst.h"
 #include "platform/zeph/value_codec.h"
 
 namespace brivo::zeph {
@@ -92,13 +93,22 @@ bool BusConnection::enqueue(Outgoing message) {
     const MutexLock lock(mutex_);
     if (over_) return false;  // whoever ends the connection has taken what waited
     outgoing_.push_back(std::move(message));
-    if (std::exchange(linkWoken_, true)) return true;
+    if (linkWoken_) return true;
   }
-  wakeLink();
+  SendBurst* burst = SendBurst::ofThisThread();
+  if (!burst || !burst->takesOver(self())) wake();
   return true;
 }
 
-void BusConnection::wakeLink() {
+void BusConnection::wake() {
+  {
+    const MutexLock lock(mutex_);
+    if (std::exchange(linkWoken_, true)) return;
+  }
+  flushOnLoop();
+}
+
+void BusConnection::flushOnLoop() {
   loop_.post([self = self()] {
     {
       const MutexLock lock(self->mutex_);

@@ -57,6 +57,9 @@ class BusConnection final : public Connection, private LinkOwner {
   bool isBacklogged() const override;
   void whenNotBacklogged(Task task) override;
 
+  /// Has the I/O thread send what waits.
+  void wake() BRIVO_EXCLUDES(mutex_);
+
  private:
   enum class End { interrupted, invalidated };
   using Clock = std::chrono::steady_clock;
@@ -68,7 +71,7 @@ class BusConnection final : public Connection, private LinkOwner {
 
   // Any thread.
   bool enqueue(Outgoing message) BRIVO_EXCLUDES(mutex_);
-  void wakeLink();
+  void flushOnLoop();
   bool isOver() const;
   Reply replyFor(std::uint64_t token);
   std::shared_ptr<BusConnection> self();

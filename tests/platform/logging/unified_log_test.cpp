@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "platform/logging/unified_log.h"
+#include "platform/logging/log_burst.h"
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
@@ -94,6 +95,37 @@ TEST(LogRingTest, AReaderThatDoesNotReadBlocksNobodyAndTheLossIsCounted) {
   for (const int fd : {saved, ends[0], ends[1]}) ::close(fd);
   EXPECT_THAT(text, HasSubstr("log lines dropped"));
   EXPECT_LT(std::ranges::count(text, '\n'), static_cast<long>(4 * LogRing::kMostLines));
+}
+
+TEST(LogBurstTest, LinesOfABurstAreAllThereWhenItGoesInTheirOrder) {
+  const test::StandardErrorCapture captured;
+  const UnifiedLog log("org.example", "test");
+  {
+    const LogBurst burst;
+    for (int i = 0; i < 5; ++i) log.write(LogLevel::standard, std::to_string(i));
+  }
+  log.write(LogLevel::standard, "behind it");
+  EXPECT_EQ(captured.text(), "<5>0\n<5>1\n<5>2\n<5>3\n<5>4\n<5>behind it\n");
+}
+
+TEST(LogBurstTest, AnErrorLineWaitsForNothing) {
+  const test::StandardErrorCapture captured;
+  const UnifiedLog log("org.example", "test");
+  const LogBurst burst;
+  log.write(LogLevel::standard, "one");
+  log.write(LogLevel::standard, "two");
+  log.write(LogLevel::error, "bad");
+  EXPECT_EQ(captured.text(), "<5>one\n<5>two\n<3>bad\n");
+}
+
+TEST(LogBurstTest, OtherThreadsWriteAtOnce) {
+  const test::StandardErrorCapture captured;
+  const UnifiedLog log("org.example", "test");
+  const LogBurst burst;
+  log.write(LogLevel::standard, "first, at once");
+  log.write(LogLevel::standard, "waits");
+  std::thread([&] { log.write(LogLevel::standard, "another thread"); }).join();
+  EXPECT_EQ(captured.text(), "<5>first, at once\n<5>another thread\n");
 }
 
 }  // namespace

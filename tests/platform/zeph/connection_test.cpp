@@ -7,6 +7,7 @@
 #include <thread>
 
 #include "platform/base/memory_file.h"
+#include "platform/zeph/send_burst.h"
 #include "support/raw_dbus.h"
 #include "support/wait.h"
 #include "zeph/echo_service.h"
@@ -177,6 +178,28 @@ TEST_F(EchoTest, SignalsArriveInOrderFromOneThread) {
   }
   ASSERT_TRUE(waitUntil([&] { return collector->count() == 5000; }));
   for (std::uint32_t i = 0; i < 5000; ++i) EXPECT_EQ(collector->received[i].second.asUnsigned(), i);
+}
+
+TEST_F(EchoTest, SignalsOfABurstArriveWhenItGoesAndThoseOfOthersMeanwhile) {
+  const auto collector = std::make_shared<SignalCollector>();
+  const auto client = connectClient(collector);
+  ASSERT_TRUE(echo(client, {}).ok());
+  const auto proxy = service->connection()->remoteObjectProxyWithErrorHandler(nullptr);
+  const auto send = [&](std::uint32_t i) {
+    proxy.send("number:", std::make_shared<const Arguments>(Arguments{i}));
+  };
+  constexpr std::uint32_t kCount = 1000;
+  {
+    const SendBurst burst;
+    for (std::uint32_t i = 0; i < kCount; ++i) send(i);
+    std::thread([&] { send(kCount); }).join();
+    EXPECT_TRUE(waitUntil([&] { return collector->count() == kCount + 1; }))
+        << "another thread wakes the loop";
+    send(kCount + 1);
+    send(kCount + 2);
+  }
+  ASSERT_TRUE(waitUntil([&] { return collector->count() == kCount + 3; }));
+  for (std::uint32_t i = 0; i < kCount + 3; ++i) EXPECT_EQ(collector->received[i].second.asUnsigned(), i);
 }
 
 TEST_F(EchoTest, TwoPostingThreadsKeepTheirOwnOrder) {

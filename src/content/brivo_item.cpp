@@ -19,7 +19,9 @@ std::uint64_t secondsSince1970(const FileTime& time) {
 
 BrivoItem::BrivoItem(std::string path, std::string name, const BrivoItem* parent, CameraDevice& device,
                      const ResourceValues& values)
-    : BrivoItem(std::move(path), std::move(name), parent, device, values.size) {
+    : BrivoItem(values.directory || !parent ? ItemPath(std::move(path))
+                                            : ItemPath(std::move(path), parent->path_, name),
+                name, parent, device, values.size) {
   setCaptureDate(secondsSince1970(values.created));
   setModificationDate(secondsSince1970(values.modified));
   setProtectionStatus(values.writable ? 0 : 1);
@@ -28,7 +30,11 @@ BrivoItem::BrivoItem(std::string path, std::string name, const BrivoItem* parent
 
 BrivoItem::BrivoItem(std::string path, std::string name, const BrivoItem* parent, CameraDevice& device,
                      std::uint64_t size)
-    : device_(device), path_(std::move(path), parent ? &parent->path_ : nullptr, name) {
+    : BrivoItem(ItemPath(std::move(path)), name, parent, device, size) {}
+
+BrivoItem::BrivoItem(ItemPath path, std::string& name, const BrivoItem* parent, CameraDevice& device,
+                     std::uint64_t size)
+    : device_(device), path_(std::move(path)) {
   setFilename(std::move(name));
   setParentObject(parent ? parent->objHandle() : 0);
   setObjectCompressedSize(size);

@@ -82,6 +82,9 @@ class BrivoItem {
   MSObjectInfoDataset& mutableInfo() { return info_; }
 
  private:
+  BrivoItem(ItemPath path, std::string& name, const BrivoItem* parent, CameraDevice& device,
+            std::uint64_t size);
+
   CameraDevice& device_;
   const ItemPath path_;
   MSObjectInfoDataset info_;

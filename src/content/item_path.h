@@ -11,10 +11,12 @@ namespace brivo {
 /// *Immutable.*
 class ItemPath {
  public:
-  /// `whole` is absolute, as bytes; `folder` is where the item's parent is, or null; `name` is the item's.
-  ItemPath(std::string whole, const ItemPath* folder, std::string_view name) {
-    isInFolder_ = folder && !folder->isInFolder_ && isNameIn(*folder->base_, whole, name);
-    base_ = isInFolder_ ? folder->base_ : std::make_shared<const std::string>(std::move(whole));
+  /// `whole` is absolute, as bytes.
+  explicit ItemPath(std::string whole) : base_(std::make_shared<const std::string>(std::move(whole))) {}
+  /// The same for the item with this name whose parent is at `folder`.
+  ItemPath(std::string whole, const ItemPath& folder, std::string_view name)
+      : isInFolder_(!folder.isInFolder_ && isNameIn(*folder.base_, whole, name)) {
+    base_ = isInFolder_ ? folder.base_ : std::make_shared<const std::string>(std::move(whole));
   }
 
   /// The whole path of the item with this name.
@@ -27,7 +29,7 @@ class ItemPath {
   }
 
   std::shared_ptr<const std::string> base_;
-  bool isInFolder_;
+  bool isInFolder_ = false;
 };
 
 }  // namespace brivo

@@ -18,7 +18,7 @@ namespace {
 
 constexpr std::string_view kSignature = "HEAPCCDR";
 constexpr std::uint64_t kFileHeader = 14;
-constexpr std::uint64_t kTail = 16 * 1024;
+constexpr std::uint64_t kTail = 16'384;
 constexpr std::uint64_t kPointerBytes = 4;
 constexpr std::uint64_t kRecordBytes = 10;
 constexpr std::uint64_t kInlineBytes = 8;

@@ -20,7 +20,7 @@ constexpr std::string_view kSignature = "\x89PNG\r\n\x1A\n"sv;
 constexpr std::string_view kExifProfile = "Raw profile type exif\0"sv;
 constexpr std::string_view kApp1Profile = "Raw profile type APP1\0"sv;
 /// 64 KiB, which EXIF does not exceed, in hexadecimal digits and lines.
-constexpr std::uint64_t kLongestProfile = 144 * 1024;
+constexpr std::uint64_t kLongestProfile = 147'456;
 
 constexpr std::uint64_t kLengthAndType = 8;
 constexpr std::uint64_t kChecksum = 4;

@@ -20,7 +20,7 @@ namespace {
 
 constexpr std::string_view kSignature = "FOVb";
 constexpr std::uint64_t kPointerBytes = 4;
-constexpr std::uint64_t kTail = 16 * 1024;
+constexpr std::uint64_t kTail = 16'384;
 constexpr std::size_t kEntryBytes = 12;
 constexpr std::uint64_t kImageHeader = 28;
 constexpr std::uint32_t kJpegFormat = 18;

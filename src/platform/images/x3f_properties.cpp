@@ -12,7 +12,7 @@ namespace brivo::images {
 
 namespace {
 
-constexpr std::uint64_t kMostBytes = 32 * 1024;
+constexpr std::uint64_t kMostBytes = 32'768;
 constexpr std::size_t kHeader = 24;
 constexpr std::size_t kEntryBytes = 8;
 constexpr std::size_t kLongestText = 64;

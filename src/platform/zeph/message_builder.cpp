@@ -8,7 +8,7 @@ namespace brivo::zeph {
 
 namespace {
 
-constexpr std::size_t kLongestArray = 64 * 1024 * 1024;
+constexpr std::size_t kLongestArray = 67'108'864;
 
 template <class Number>
 Number valueAt(const void* value) {

@@ -37,7 +37,7 @@ class MessageBuilder {
 
  private:
   struct Container {
-    char type;
+    char type = 0;
     std::size_t lengthAt = 0;
     std::size_t contentsAt = 0;
   };

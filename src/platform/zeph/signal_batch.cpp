@@ -14,7 +14,7 @@ namespace brivo::zeph {
 namespace {
 
 /// The kernel takes this much whole or not at all, so that a message is hardly ever written in part.
-constexpr std::size_t kFull = 24 * 1024;
+constexpr std::size_t kFull = 24'576;
 
 /// sd-bus counts its own messages on the connection from 1 on.
 constexpr std::uint32_t kFirstSerial = 0x8000'0000;

@@ -22,7 +22,7 @@ Dictionary ImageMetadata::dictionary() const {
 }
 
 std::optional<std::string> ImageMetadata::creationDateTime() const {
-  const auto ofExif = text(ExifGroup::exif, "DateTime");
+  auto ofExif = text(ExifGroup::exif, "DateTime");
   if (ofExif && !modificationDateTime()) return ofExif;
   if (auto original = text(ExifGroup::exif, "DateTimeOriginal")) return original;
   if (auto ofTiff = text(ExifGroup::tiff, "DateTime")) return ofTiff;

@@ -23,6 +23,10 @@ bool sealForReaders(int fd) {
   return ::fcntl(fd, F_ADD_SEALS, seals) == 0;
 }
 
+bool sealForGood(int fd) {
+  return ::fcntl(fd, F_ADD_SEALS, F_SEAL_SHRINK | F_SEAL_GROW | F_SEAL_WRITE | F_SEAL_SEAL) == 0;
+}
+
 bool sealAgainstShrinking(int fd) { return ::fcntl(fd, F_ADD_SEALS, F_SEAL_SHRINK) == 0; }
 
 std::optional<MemfdStatus> statusOfUnshrinkable(int fd) {

@@ -17,6 +17,9 @@ UniqueFd makeMemfd(const char* name, std::size_t size);
 /// Seals for good against shrinking, growing and new ways to write; mappings that are there stay writable.
 /// False when the kernel refuses.
 bool sealForReaders(int fd);
+/// Seals for good against every change. False when the kernel refuses, as it does while a writable mapping is
+/// there (EBUSY).
+bool sealForGood(int fd);
 /// Seals against shrinking, after which no access to a mapping can fault. False when the kernel refuses.
 bool sealAgainstShrinking(int fd);
 

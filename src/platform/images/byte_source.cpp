@@ -13,4 +13,14 @@ std::size_t MemorySource::read(std::span<std::byte> buffer, std::uint64_t offset
   return count;
 }
 
+bool readAll(const ByteSource& source, std::span<std::byte> buffer, std::uint64_t offset) {
+  while (!buffer.empty()) {
+    const std::size_t count = source.read(buffer, offset);
+    if (count == 0) return false;
+    buffer = buffer.subspan(count);
+    offset += count;
+  }
+  return true;
+}
+
 }  // namespace brivo::images

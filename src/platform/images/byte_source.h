@@ -17,6 +17,9 @@ class ByteSource {
   virtual std::size_t read(std::span<std::byte> buffer, std::uint64_t offset) const = 0;
 };
 
+/// Fills `buffer` with the bytes from `offset` on; false when not all of them are there.
+bool readAll(const ByteSource& source, std::span<std::byte> buffer, std::uint64_t offset);
+
 /// An image that is in memory already. The bytes are borrowed.
 class MemorySource final : public ByteSource {
  public:

@@ -24,12 +24,6 @@ constexpr std::array kBrands{fourCharacters("mif1"), fourCharacters("mif2"), fou
                              fourCharacters("hevx"), fourCharacters("hevm"), fourCharacters("hevs"),
                              fourCharacters("avis"), fourCharacters("avcs"), fourCharacters("jpgs")};
 
-bool isHeif(Parse& parse) {
-  return std::ranges::any_of(brandsOf(parse), [](FourCharacters brand) {
-    return std::ranges::find(kBrands, brand) != kBrands.end();
-  });
-}
-
 /// How a stored picture is turned, as a mirroring of left and right that may come first and quarter-turns
 /// clockwise.
 class Turning {
@@ -185,6 +179,12 @@ void readMeta(Parse& parse, const Box& meta) {
 }
 
 }  // namespace
+
+bool isHeif(Parse& parse) {
+  return std::ranges::any_of(brandsOf(parse), [](FourCharacters brand) {
+    return std::ranges::find(kBrands, brand) != kBrands.end();
+  });
+}
 
 bool readHeifFile(Parse& parse) {
   if (!isHeif(parse)) return false;

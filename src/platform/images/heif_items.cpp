@@ -124,6 +124,52 @@ HeifPlace placeIn(const Box& holder, const Extent& extent) {
   return {holder.start + extent.offset, extent.length != 0 ? extent.length : room, true};
 }
 
+/// What an iref box holds of one kind of reference: who refers, and to whom.
+struct Reference {
+  std::uint32_t from;
+  ByteCursor to;
+};
+
+/// Walks the references of one kind.
+class ReferenceTable {
+ public:
+  ReferenceTable(Parse& parse, const Box& list, FourCharacters kind)
+      : parse_(parse), boxes_(parse, list, kFullBoxBytes), kind_(kind) {
+    ByteCursor header = contentOf(parse, list, kFullBoxBytes);
+    isLong_ = fullBoxHeader(header).version != 0;
+  }
+
+  std::optional<Reference> next() {
+    while (const auto box = boxes_.next()) {
+      if (box->type != kind_) continue;
+      ByteCursor cursor = contentOf(parse_, *box);
+      const std::uint32_t from = shortOrLong(cursor, isLong_);
+      return Reference{from, cursor};
+    }
+    return std::nullopt;
+  }
+
+  std::vector<std::uint32_t> targets(Reference reference) {
+    const std::size_t count = parse_.spendEntries(reference.to.u16());
+    std::vector<std::uint32_t> items;
+    for (std::size_t i = 0; i < count && reference.to.remaining() >= 2; ++i)
+      items.push_back(shortOrLong(reference.to, isLong_));
+    return items;
+  }
+
+ private:
+  Parse& parse_;
+  Boxes boxes_;
+  const FourCharacters kind_;
+  bool isLong_ = false;
+};
+
+std::vector<Box> remaining(Boxes boxes) {
+  std::vector<Box> list;
+  while (const auto box = boxes.next()) list.push_back(*box);
+  return list;
+}
+
 }  // namespace
 
 HeifItems::HeifItems(Parse& parse, const Box& meta) : parse_(parse), meta_(meta) {
@@ -139,12 +185,25 @@ std::optional<std::uint32_t> HeifItems::primary() const {
   return cursor.ok() ? std::optional(id) : std::nullopt;
 }
 
-std::vector<HeifItem> HeifItems::itemsOf(FourCharacters type, FourCharacters other) const {
-  constexpr std::size_t kMostItems = 32;
+Boxes HeifItems::infos() const {
   const Box list = table(fourCharacters("iinf"));
   ByteCursor cursor = contentOf(parse_, list, kFullBoxBytes);
   const std::uint64_t countBytes = fullBoxHeader(cursor).version == 0 ? 2 : 4;
-  Boxes boxes(parse_, list, kFullBoxBytes + countBytes);
+  return Boxes(parse_, list, kFullBoxBytes + countBytes);
+}
+
+std::vector<HeifItem> HeifItems::items() const {
+  std::vector<HeifItem> items;
+  Boxes boxes = infos();
+  while (const auto box = boxes.next()) {
+    if (const auto item = itemOf(parse_, *box)) items.push_back(*item);
+  }
+  return items;
+}
+
+std::vector<HeifItem> HeifItems::itemsOf(FourCharacters type, FourCharacters other) const {
+  constexpr std::size_t kMostItems = 32;
+  Boxes boxes = infos();
   std::vector<HeifItem> items;
   while (items.size() < kMostItems) {
     const auto box = boxes.next();
@@ -156,38 +215,49 @@ std::vector<HeifItem> HeifItems::itemsOf(FourCharacters type, FourCharacters oth
 }
 
 std::vector<std::uint32_t> HeifItems::referencesOf(FourCharacters kind, std::uint32_t from) const {
-  const Box list = table(fourCharacters("iref"));
-  ByteCursor header = contentOf(parse_, list, kFullBoxBytes);
-  const bool isLong = fullBoxHeader(header).version != 0;
-  std::vector<std::uint32_t> references;
-  Boxes boxes(parse_, list, kFullBoxBytes);
-  while (const auto box = boxes.next()) {
-    if (box->type != kind) continue;
-    ByteCursor cursor = contentOf(parse_, *box);
-    if (shortOrLong(cursor, isLong) != from) continue;
-    const std::size_t count = parse_.spendEntries(cursor.u16());
-    for (std::size_t i = 0; i < count && cursor.remaining() >= 2; ++i)
-      references.push_back(shortOrLong(cursor, isLong));
+  std::vector<std::uint32_t> items;
+  ReferenceTable references(parse_, table(fourCharacters("iref")), kind);
+  while (const auto reference = references.next()) {
+    if (reference->from != from) continue;
+    const auto more = references.targets(*reference);
+    items.insert(items.end(), more.begin(), more.end());
   }
-  return references;
+  return items;
+}
+
+std::vector<std::uint32_t> HeifItems::referringTo(FourCharacters kind, std::uint32_t to) const {
+  std::vector<std::uint32_t> items;
+  ReferenceTable references(parse_, table(fourCharacters("iref")), kind);
+  while (const auto reference = references.next()) {
+    const auto targets = references.targets(*reference);
+    if (std::ranges::find(targets, to) != targets.end()) items.push_back(reference->from);
+  }
+  return items;
 }
 
 std::vector<Box> HeifItems::propertiesOf(std::uint32_t item) const {
   constexpr std::size_t kMostProperties = 64;
-  std::vector<Box> list, properties;
-  Boxes boxes(parse_, table(fourCharacters("iprp")));
-  while (const auto box = boxes.next()) {
-    if (box->type == fourCharacters("ipco")) {
-      Boxes children(parse_, *box);
-      while (const auto child = children.next()) list.push_back(*child);
-    } else if (box->type == fourCharacters("ipma")) {
-      for (const std::uint16_t index : associationsOf(contentOf(parse_, *box), item)) {
-        if (index != 0 && index <= list.size() && properties.size() < kMostProperties)
-          properties.push_back(list[index - 1U]);
-      }
+  std::vector<Box> properties;
+  const auto& [listed, associations] = this->properties();
+  for (const Box& table : associations) {
+    for (const std::uint16_t index : associationsOf(contentOf(parse_, table), item)) {
+      if (index != 0 && index <= listed.size() && properties.size() < kMostProperties)
+        properties.push_back(listed[index - 1U]);
     }
   }
   return properties;
+}
+
+const HeifItems::Properties& HeifItems::properties() const {
+  if (properties_) return *properties_;
+  properties_.emplace();
+  for (const Box& box : remaining(Boxes(parse_, table(fourCharacters("iprp"))))) {
+    if (box.type == fourCharacters("ipma")) properties_->associations.push_back(box);
+    if (box.type != fourCharacters("ipco")) continue;
+    const auto children = remaining(Boxes(parse_, box));
+    properties_->listed.insert(properties_->listed.end(), children.begin(), children.end());
+  }
+  return *properties_;
 }
 
 HeifPlace HeifItems::placeOf(std::uint32_t item) const {

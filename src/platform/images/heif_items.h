@@ -29,10 +29,14 @@ class HeifItems {
 
   /// The item that the file is there for.
   std::optional<std::uint32_t> primary() const;
+  /// All items, in the order of the file, as far as the parse goes.
+  std::vector<HeifItem> items() const;
   /// The items with one of two types, in the order of the file; the first few dozen if there are more.
   std::vector<HeifItem> itemsOf(FourCharacters type, FourCharacters other) const;
   /// The items that item `from` refers to in the way that `kind` names, in their order.
   std::vector<std::uint32_t> referencesOf(FourCharacters kind, std::uint32_t from) const;
+  /// The items that refer to item `to` in the way that `kind` names, in the order of the file.
+  std::vector<std::uint32_t> referringTo(FourCharacters kind, std::uint32_t to) const;
   /// The properties of an item, in the order in which they are applied to it.
   std::vector<Box> propertiesOf(std::uint32_t item) const;
   /// Where an item is: its extents as long as each begins where the one before ends.
@@ -40,9 +44,18 @@ class HeifItems {
 
  private:
   Box table(FourCharacters type) const { return childOf(parse_, meta_, type, kFullBoxBytes); }
+  Boxes infos() const;
+
+  struct Properties {
+    std::vector<Box> listed;        ///< those that items can have
+    std::vector<Box> associations;  ///< the tables that say which item has which
+  };
+  const Properties& properties() const;
 
   Parse& parse_;
   const Box meta_;
+  /// Read when first asked for, and kept: a picture made of many asks for those of each.
+  mutable std::optional<Properties> properties_;
 };
 
 }  // namespace brivo::images

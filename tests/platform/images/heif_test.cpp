@@ -5,6 +5,7 @@
 
 #include "bounded.h"
 #include "iso_bytes.h"
+#include "platform/images/heif_items.h"
 #include "reading.h"
 
 namespace brivo::images {
@@ -282,6 +283,22 @@ TEST(Heif, ManyItemsAndPropertiesStayWithinBounds) {
   EXPECT_EQ(readBasics(bytes)->size, (PixelSize{16384, 12288}));
   EXPECT_EQ(readBasics(bytes)->entries.find(ExifGroup::tiff, "Make"), Value("Maker"));
   expectBounded(bytes);
+}
+
+TEST(Heif, ItemsAndThoseThatReferToThemAreListed) {
+  HeifBytes file = typical();
+  file.item(4, "hvc1");
+  file.reference("thmb", 4, {7, 1});
+  file.reference("dimg", 5, {1});
+  const CountingSource source(file.build());
+  Parse parse(source, Scope::basics);
+  const HeifItems items(parse, childOf(parse, Box{.length = source.size()}, fourCharacters("meta")));
+  std::vector<std::uint32_t> listed;
+  for (const HeifItem& item : items.items()) listed.push_back(item.id);
+  EXPECT_EQ(listed, (std::vector<std::uint32_t>{1, 2, 3, 4}));
+  EXPECT_EQ(items.referringTo(fourCharacters("thmb"), 1), (std::vector<std::uint32_t>{3, 4}));
+  EXPECT_EQ(items.referringTo(fourCharacters("thmb"), 7), (std::vector<std::uint32_t>{4}));
+  EXPECT_TRUE(items.referringTo(fourCharacters("thmb"), 2).empty());
 }
 
 TEST(Heif, EveryCutOfAFileGivesWhatIsLeft) {

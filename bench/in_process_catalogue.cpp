@@ -58,6 +58,7 @@ InProcessCatalogue::~InProcessCatalogue() { pool_.waitUntilIdle(); }
 DeviceServices InProcessCatalogue::services() {
   return {pool_,
           systemFiles(),
+          images_,
           power_,
           nullptr,
           [this] { return std::move(connections_.anonymousListener(*folder_)).value(); },

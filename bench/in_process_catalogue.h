@@ -6,6 +6,7 @@
 #include "card.h"
 #include "catalogue_recorder.h"
 #include "device/brivo_device.h"
+#include "imaging/local_image_decoder.h"
 #include "platform/zeph/connection_service.h"
 
 namespace brivo::bench {
@@ -33,6 +34,7 @@ class InProcessCatalogue {
   zeph::ConnectionService connections_{pool_, nullptr};
   std::unique_ptr<zeph::RuntimeFolder> folder_;
   NoPower power_;
+  LocalImageDecoder images_;
 };
 
 }  // namespace brivo::bench

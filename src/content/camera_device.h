@@ -14,7 +14,9 @@
 namespace brivo {
 
 class BrivoItem;
+class ImageDecoder;
 class MetadataArchive;
+class ReadMemory;
 
 /// Owned by the device's side; items know it by this alone, and do not own it. *Thread-safe.*
 class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
@@ -32,11 +34,17 @@ class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
 
   virtual void addCameraFileToIndex(const std::shared_ptr<BrivoItem>& item) = 0;
   virtual void addCameraFolderToIndex(const std::shared_ptr<BrivoItem>& item) = 0;
+  /// The indexed item with this handle; null when there is none.
+  virtual std::shared_ptr<BrivoItem> cameraItemWithObjectID(std::uint64_t handle) const = 0;
   /// Sends serialised datasets to all clients as one content batch.
   virtual void flushNotifications(Array datasets) = 0;
 
   /// Where the metadata of the device's pictures are kept.
   virtual MetadataArchive& metadataArchive() = 0;
+
+  /// What bytes of the device's files are read into for clients.
+  virtual ReadMemory& readMemory() = 0;
+  virtual ImageDecoder& imageDecoder() const = 0;
 
   /// A queue of its own for work on one of the device's files.
   virtual std::shared_ptr<SerialQueue> makeSerialQueue() = 0;

@@ -2,6 +2,7 @@
 #include "daemon/service.h"
 
 #include "platform/base/paths.h"
+#include "platform/decoding/worker_program.h"
 #include "platform/preferences/preferences_store.h"
 #include "platform/settings/folders.h"
 #include "util/log.h"
@@ -28,6 +29,8 @@ Service::Service(RunLoop& mainLoop, Settings settings, std::unique_ptr<zeph::Run
       folder_(std::move(folder)),
       applications_(settings_.dataHome, settings_.dataDirs, std::string(kVendorPrefix)),
       power_(mainLoop_, [](const std::string& line) { OVLogError("power", "{}", line); }),
+      images_({.program = installedWorkerProgram(),
+               .log = [](std::string_view line) { OVLog("imaging", "{}", line); }}),
       database_(pool_, dataFolder(settings_)),
       connections_(pool_, [](const std::string& line) { OVLogError("zeph", "{}", line); }),
       volumes_(pool_, settings_.volumeRoots, settings_.volumeFolders),
@@ -72,6 +75,7 @@ void Service::exitWhenIdle() {
 DeviceServices Service::deviceServices() {
   return {pool_,
           systemFiles(),
+          images_,
           power_,
           &access_,
           [this]() -> std::shared_ptr<zeph::Listener> {

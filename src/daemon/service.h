@@ -9,6 +9,7 @@
 #include "access/device_access_manager.h"
 #include "daemon/device_manager.h"
 #include "platform/applications/desktop_catalogue.h"
+#include "platform/decoding/imaging_service.h"
 #include "platform/identity/task_identity.h"
 #include "platform/keepalive/idle_exit.h"
 #include "platform/power/logind_inhibitors.h"
@@ -44,6 +45,7 @@ class Service {
   DesktopCatalogue applications_;
   TaskIdentity identity_{applications_};
   LogindInhibitors power_;
+  ImagingService images_;
   AccessDatabase database_;
   OVDeviceAccessManager access_{database_, applications_, nullptr};
   Transactions transactions_;

@@ -17,10 +17,12 @@
 #include "device/device_services.h"
 #include "device/object_index.h"
 #include "device/object_requests.h"
+#include "io/read_memory.h"
 #include "platform/base/mutex.h"
 #include "platform/base/url.h"
 #include "platform/work/lane.h"
 #include "platform/work/operation_queue.h"
+#include "protocol/result_codes.h"
 
 namespace brivo {
 
@@ -104,7 +106,12 @@ class BrivoDevice final : public CameraDevice,
     index_.addCameraFolderToIndex(item);
   }
   void flushNotifications(Array datasets) override { notifications_.flushNotifications(std::move(datasets)); }
+  std::shared_ptr<BrivoItem> cameraItemWithObjectID(std::uint64_t handle) const override {
+    return index_.cameraItemWithObjectID(handle);
+  }
   MetadataArchive& metadataArchive() override { return metadataArchive_; }
+  ReadMemory& readMemory() override { return readMemory_; }
+  ImageDecoder& imageDecoder() const override { return services_.images; }
   std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(services_.pool); }
   void addInitiatedOperation(Task operation) override;
   void enumerateConcurrently(Task step) override;
@@ -144,11 +151,12 @@ class BrivoDevice final : public CameraDevice,
 
   CatalogueCounters counters_;
   MetadataArchive metadataArchive_;
+  ReadMemory readMemory_{kLongestRead};
   ObjectIndex index_{counters_};
   const std::shared_ptr<OVClientManager> clientManager_;
   DeviceNotifications notifications_;
   ContentEnumeration enumeration_;
-  ObjectRequests requests_{index_, notifications_};
+  ObjectRequests requests_{index_, notifications_, readMemory_};
   DeviceService service_{*this, services_};
   std::shared_ptr<zeph::Listener> listener_;
   PowerAssertions::Handle cpPowerAssertion_;  // operation queue

@@ -7,6 +7,7 @@
 
 #include "access/device_access_manager.h"
 #include "platform/base/value.h"
+#include "platform/decoding/image_decoder.h"
 #include "platform/files/file_system.h"
 #include "platform/identity/audit_token.h"
 #include "platform/power/power_assertions.h"
@@ -20,6 +21,7 @@ namespace brivo {
 struct DeviceServices {
   Pool& pool;
   FileSystem& files;
+  ImageDecoder& images;
   PowerAssertions& power;
   /// Null when nobody can decide; then every client is refused.
   OVDeviceAccessManager* access;

@@ -12,9 +12,6 @@ namespace brivo {
 
 namespace {
 
-/// From here on bytes are read straight into the memory that travels to the client.
-constexpr std::uint64_t kTravellingMemory = 65'536;
-
 Dictionary errorResult(std::int32_t code) {
   Dictionary result;
   result.set(keys::kErrorCode, code);
@@ -34,10 +31,9 @@ std::size_t usable(std::int64_t count) { return count > 0 ? static_cast<std::siz
 
 }  // namespace
 
-ObjectRequests::ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications)
-    : index_(index),
-      notifications_(notifications),
-      memory_(MemoryPool::create("brivod-read", kLongestRead, 2)) {}
+ObjectRequests::ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications,
+                               ReadMemory& memory)
+    : index_(index), notifications_(notifications), memory_(memory) {}
 
 void ObjectRequests::requestMetadataForObjectHandle(std::uint64_t handle, const Dictionary& options,
                                                     const ResultHandler& reply) {
@@ -138,22 +134,10 @@ Data ObjectRequests::read(BrivoFile& file, const Range& range) {
     data = cache->consumeBufferAtOffset(range.offset, size).value_or(Data());
     cache->setConsumedOffset(static_cast<std::int64_t>(range.offset));
   } else {
-    data = readDirectly(file, range);
+    data = memory_.read(file, range.offset, static_cast<std::size_t>(range.length));
   }
   file.closeStream();
   return data;
-}
-
-Data ObjectRequests::readDirectly(const BrivoFile& file, const Range& range) {
-  if (range.length < kTravellingMemory) {
-    std::vector<std::byte> buffer(range.length);
-    buffer.resize(usable(file.readStream(buffer, range.offset)));
-    return Data(std::move(buffer));
-  }
-  auto block = memory_->take();
-  if (!block) return {};
-  const std::size_t count = usable(file.readStream(block->bytes().first(range.length), range.offset));
-  return count > 0 ? std::move(*block).send(count) : Data();
 }
 
 void ObjectRequests::tellProgress(const BrivoFile& file, std::uint64_t delivered) const {
@@ -210,7 +194,7 @@ void ObjectRequests::forgetClient(std::int32_t client) {
     closeStream(file, client);
   }
   buffers_.forget(client);
-  memory_->trim();
+  memory_.trim();
 }
 
 void ObjectRequests::closeAllStreams() {

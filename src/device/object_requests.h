@@ -11,7 +11,7 @@
 #include "device/device_notifications.h"
 #include "device/object_index.h"
 #include "device/read_buffers.h"
-#include "platform/base/memory_pool.h"
+#include "io/read_memory.h"
 #include "platform/base/value.h"
 
 namespace brivo {
@@ -21,7 +21,7 @@ namespace brivo {
 class ObjectRequests {
  public:
   /// All must outlive this.
-  ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications);
+  ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications, ReadMemory& memory);
 
   void requestMetadataForObjectHandle(std::uint64_t handle, const Dictionary& options,
                                       const ResultHandler& reply);
@@ -64,13 +64,11 @@ class ObjectRequests {
   Dictionary readIntoBuffer(BrivoFile* file, Range range, const Dictionary& options, const Value& buffer,
                             std::int32_t client);
   Data read(BrivoFile& file, const Range& range);
-  Data readDirectly(const BrivoFile& file, const Range& range);
   void tellProgress(const BrivoFile& file, std::uint64_t delivered) const;
 
   ObjectIndex& index_;
   const DeviceNotifications& notifications_;
-  /// What travels without having been read ahead; one piece may be with the client while the next is read.
-  const std::shared_ptr<MemoryPool> memory_;
+  ReadMemory& memory_;  // for what was not read ahead
   ReadBuffers buffers_;
   /// Files by the process that has them open, once for each time.
   std::multimap<std::int32_t, std::shared_ptr<BrivoFile>> openStreams_;

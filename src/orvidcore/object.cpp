@@ -4,22 +4,23 @@
 #include "orvidcore/piece_stream.h"
 #include "orvidcore/saved_file.h"
 #include "orvidcore/session.h"
+#include "protocol/keys.h"
 #include "protocol/result_codes.h"
 #include "protocol/selectors.h"
 
 namespace orvid {
 
+namespace keys = brivo::keys;
 namespace selectors = brivo::selectors;
 
 namespace {
 
 /// How much of what an earlier try saved is compared with the card before it is gone on with, in bytes.
 constexpr std::uint64_t kCompared = 65'536;
-constexpr const char* kThumbnailSizeOption = "OVThumbnailMaxPixelSize";
 
 Dictionary thumbnailOptions(std::uint32_t maximumPixelSize) {
   Dictionary options;
-  options.set(kThumbnailSizeOption, maximumPixelSize);
+  options.set(keys::kThumbnailMaxPixelSize, maximumPixelSize);
   return options;
 }
 

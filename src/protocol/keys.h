@@ -42,6 +42,9 @@ inline constexpr std::string_view kObjectID = "OVObjectID";
 
 // Object requests and their results.
 inline constexpr std::string_view kErrorCode = "errCode";
+inline constexpr std::string_view kThumbnailMaxPixelSize = "OVThumbnailMaxPixelSize";
+inline constexpr std::string_view kThumb = "thumb";
+inline constexpr std::string_view kMetadata = "metadata";
 inline constexpr std::string_view kReadOffset = "OVReadOffset";
 inline constexpr std::string_view kReadLength = "OVReadLength";
 inline constexpr std::string_view kReadBufferStreamOpen = "OVReadBufferStreamOpen";

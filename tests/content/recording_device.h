@@ -2,6 +2,7 @@
 // A device that keeps what items tell it, for tests of items on real files.
 #pragma once
 
+#include <algorithm>
 #include <mutex>
 #include <string>
 #include <vector>
@@ -9,6 +10,8 @@
 #include "content/brivo_folder.h"
 #include "content/camera_device.h"
 #include "content/media/brivo_file.h"
+#include "imaging/local_image_decoder.h"
+#include "io/read_memory.h"
 #include "platform/work/pool.h"
 #include "ptp/object_info_dataset.h"
 
@@ -34,7 +37,14 @@ class RecordingDevice : public CameraDevice {
     const std::lock_guard lock(mutex);
     batches.push_back(std::move(datasets));
   }
+  std::shared_ptr<BrivoItem> cameraItemWithObjectID(std::uint64_t handle) const override {
+    const auto found =
+        std::ranges::find(folders, handle, [](const auto& folder) { return folder->objHandle(); });
+    return found == folders.end() ? nullptr : *found;
+  }
   MetadataArchive& metadataArchive() override { return archive; }
+  ReadMemory& readMemory() override { return memory; }
+  ImageDecoder& imageDecoder() const override { return decoder; }
   std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(pool); }
   void addInitiatedOperation(Task operation) override { operations.push_back(std::move(operation)); }
   /// Steps run in order on the test's thread, in run().
@@ -75,6 +85,8 @@ class RecordingDevice : public CameraDevice {
   /// What items have asked to be done later.
   std::vector<Task> operations;
   MetadataArchive archive;
+  ReadMemory memory{4'194'304};
+  mutable LocalImageDecoder decoder;
 };
 
 }  // namespace brivo

@@ -9,6 +9,7 @@
 
 #include "access/access_database.h"
 #include "device/fake_connection.h"
+#include "imaging/local_image_decoder.h"
 #include "platform/zeph/connection_service.h"
 #include "protocol/keys.h"
 #include "protocol/selectors.h"
@@ -56,6 +57,7 @@ class DeviceManagerTest : public testing::Test {
   DeviceServices services() {
     return {pool,
             systemFiles(),
+            images,
             power,
             nullptr,
             [this]() -> std::shared_ptr<zeph::Listener> {
@@ -97,6 +99,7 @@ class DeviceManagerTest : public testing::Test {
   zeph::ConnectionService connections{pool, nullptr};
   std::unique_ptr<zeph::RuntimeFolder> folder = std::move(zeph::RuntimeFolder::claim(runtime.path())).value();
   NoPower power;
+  LocalImageDecoder images;
   bool noListeners = false;
   SaidDomains domains;
   Transactions transactions;

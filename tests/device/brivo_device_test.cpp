@@ -10,6 +10,7 @@
 #include <set>
 
 #include "access/access_database.h"
+#include "imaging/local_image_decoder.h"
 #include "platform/zeph/connection_service.h"
 #include "protocol/keys.h"
 #include "protocol/protocols.h"
@@ -95,6 +96,7 @@ class BrivoDeviceTest : public testing::Test {
   DeviceServices services() {
     return {pool,
             systemFiles(),
+            images,
             power,
             access,
             [this]() -> std::shared_ptr<zeph::Listener> {
@@ -141,6 +143,7 @@ class BrivoDeviceTest : public testing::Test {
   zeph::ConnectionService connections{pool, nullptr};
   std::unique_ptr<zeph::RuntimeFolder> folder = std::move(zeph::RuntimeFolder::claim(runtime.path())).value();
   CountingPower power;
+  LocalImageDecoder images;
   NoApplications applications;
   AccessDatabase database{pool, home / "data"};
   OVDeviceAccessManager manager{database, applications, nullptr};

@@ -51,7 +51,8 @@ class ObjectRequestsTest : public testing::Test {
   ObjectIndex index{counters};
   std::shared_ptr<OVClientManager> clients = std::make_shared<OVClientManager>([](const Task&) {});
   DeviceNotifications notifications{*clients, counters, [] { return "UUID"; }};
-  ObjectRequests requests{index, notifications};
+  ReadMemory readMemory{4'194'304};
+  ObjectRequests requests{index, notifications, readMemory};
 };
 
 TEST_F(ObjectRequestsTest, OffsetEqualToTheSizeIsOutsideAndTheWholeFileIsInside) {

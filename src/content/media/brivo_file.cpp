@@ -21,7 +21,7 @@ std::shared_ptr<BrivoFile> BrivoFile::initWithFSURL(std::string path, std::strin
                                                     const ResourceValues* prefetched) {
   const auto values = valuesOf(path, device, prefetched);
   if (!values) return nullptr;
-  const auto file =
+  auto file =
       std::make_shared<BrivoFile>(MakingKey(), std::move(path), std::move(name), parent, device, *values);
   file->decideKind();
   if (file->hasMetadata()) readFirstMetadata(file);

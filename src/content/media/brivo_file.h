@@ -130,6 +130,26 @@ class BrivoFile final : public BrivoItem, public ReadAheadSource {
   void addSubImageDict(const SubImage& image);
   /// The narrowest image of at least that width; none when all are narrower.
   std::optional<SubImage> subImageDictForPixelWidth(std::uint32_t width) const;
+
+  /// Answers once, with the metadata, the orientation, and a JPEG of at least the wanted width, as far as
+  /// there are any. The JPEG is not rotated.
+  void thumbnailDataWithOptions(const Dictionary& options, const ResultHandler& reply) override;
+  /// A JPEG that is `width` pixels wide or wider where the file holds one, else one whose longer side is
+  /// `width` pixels, or that of the image when it is shorter; 0: the smallest in the file, else the image in
+  /// its size.
+  std::optional<Data> thumbnailDataForPixelWidth(std::uint32_t width);
+  std::optional<Data> imageThumbnailDataForPixelWidth(std::uint32_t width);
+  /// The bytes of an embedded JPEG, unchanged; none when they are not in the file or do not begin as one.
+  std::optional<Data> createThumbnailUsingOffsets(const SubImage& image);
+  /// A JPEG of the decoded image.
+  std::optional<Data> createImageDataForPixelWidth(std::uint32_t width) const;
+  /// The whole file beside this one that has its name with the extension "THM".
+  std::optional<Data> thumbnailDataUsingSidecarFiles() const;
+  /// The file's bytes, as many as the low 32 bits of its size say.
+  std::optional<Data> imageData();
+  /// Always none.
+  static std::optional<Dictionary> exifThumbOffsets() { return std::nullopt; }
+
   /// A small embedded image has been found, and a large one.
   bool smallThumbnail() const { return smallThumbnail_; }
   bool previewThumbnail() const { return previewThumbnail_; }
@@ -172,6 +192,7 @@ class BrivoFile final : public BrivoItem, public ReadAheadSource {
   void setEmbeddedThumbnail(const images::EmbeddedImage& thumbnail);
   void readRawProperties(const Dictionary& raw, Dictionary& properties);
   std::optional<ImageMetadata> imageMetadata() const;
+  std::optional<Data> readInside(std::uint32_t offset, std::uint32_t length) const;
 
   FileStream stream_;
   SubImages subImages_;

@@ -35,6 +35,7 @@ CLI::App* addServiceCommand(CLI::App& app, CommonOptions& common, const char* na
 // Each adds its subcommands; a subcommand that runs leaves its exit code in `exitCode`.
 void addDeviceCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addObjectCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
+void addPictureCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addTransferCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addAccessCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);
 void addExplainCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode);

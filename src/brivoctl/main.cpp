@@ -21,6 +21,7 @@ int main(int argc, char** argv) {
   ExitCode exitCode = kSuccess;
   addDeviceCommands(app, common, exitCode);
   addObjectCommands(app, common, exitCode);
+  addPictureCommands(app, common, exitCode);
   addTransferCommands(app, common, exitCode);
   addAccessCommands(app, common, exitCode);
   addExplainCommands(app, common, exitCode);

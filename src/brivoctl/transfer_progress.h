@@ -7,6 +7,7 @@
 #include <string>
 
 #include "brivoctl/output.h"
+#include "brivoctl/progress_line.h"
 #include "orvidcore/orvidcore.h"
 
 namespace brivoctl {
@@ -17,7 +18,6 @@ class TransferProgress {
  public:
   /// `size` is the sum of all files, in bytes.
   TransferProgress(bool json, std::uint64_t size);
-  ~TransferProgress() { finish(); }
   TransferProgress(const TransferProgress&) = delete;
   TransferProgress& operator=(const TransferProgress&) = delete;
 
@@ -37,23 +37,22 @@ class TransferProgress {
 
  private:
   using Clock = std::chrono::steady_clock;
-  enum class Form { none, bar, json };
 
   void show();
-  void erase();
-  std::string bar(int columns) const;
+  void showJson();
+  void showBar();
 
-  const Form form_;
+  const bool json_;
   const std::uint64_t size_;
   const Clock::time_point start_ = Clock::now();
 
   std::mutex mutex_;
+  ProgressLine line_;
   orvid::ObjectInfo object_;
   std::uint64_t before_ = 0;  // bytes of the files that are over
   std::uint64_t given_ = 0;   // bytes that say nothing of the rate
   std::uint64_t bytes_ = 0;   // of the current file
   Clock::time_point shown_ = start_;
-  bool visible_ = false;
 };
 
 /// Such as "1:05:09", hours only when there are any.

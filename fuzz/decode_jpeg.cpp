@@ -1,0 +1,8 @@
+// SPDX-License-Identifier: MIT
+#include "decoder_check.h"
+
+// JPEG files.
+int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  brivo::imaging::checkDecoder(brivo::imaging::decodeJpeg, data, size);
+  return 0;
+}

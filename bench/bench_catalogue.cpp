@@ -116,7 +116,7 @@ struct Series {
 
   void add() {
     RemoteCatalogue catalogue(card);
-    const double before = catalogue.service().settledKilobytes();
+    const double before = catalogue.service().process().settledKilobytes();
     timeOfBareWalk(card);
     listing.push_back(timeOfBareListing(card));
     const CatalogueTimes times = catalogue.enumerate();
@@ -124,7 +124,7 @@ struct Series {
     firstBatch.push_back(times.firstBatch);
     firstFile.push_back(times.firstFile);
     last.push_back(times.last);
-    kilobytes.push_back(catalogue.service().settledKilobytes() - before);
+    kilobytes.push_back(catalogue.service().process().settledKilobytes() - before);
   }
 
   const Card card;

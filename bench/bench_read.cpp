@@ -148,7 +148,7 @@ void compareWithDd(LargeFile& file, const Options& options) {
 double rateOfPeer(const LargeFile& file) {
   return file.rate(
       runOrThrow({"gphoto2", "--camera", "Mass Storage Camera", "--port", "disk:" + file.card().path(),
-                  "--folder", Card::firstFolder(), "--stdout", "--get-file", Card::firstName()})
+                  "--folder", Card::firstFolder(), "--stdout", "--get-file", file.card().firstName()})
           .milliseconds);
 }
 

@@ -98,13 +98,14 @@ std::vector<WireClient> connectIdleClients(const ServiceProcess& service) {
 
 /// The threads when those that only helped out have gone, which takes them a second.
 std::size_t settledThreads(const ServiceProcess& service, std::size_t expected) {
-  test::waitUntil([&] { return service.threadCount() <= expected; }, std::chrono::seconds(3));
-  return service.threadCount();
+  test::waitUntil([&] { return service.process().threadCount() <= expected; }, std::chrono::seconds(3));
+  return service.process().threadCount();
 }
 
 void printCostOfIdleClients(const ServiceProcess& service, std::size_t threads, double kilobytes) {
   const std::size_t threadsNow = settledThreads(service, threads);
-  const double perClient = (service.settledKilobytes() - kilobytes) / static_cast<double>(kIdleClients);
+  const double perClient =
+      (service.process().settledKilobytes() - kilobytes) / static_cast<double>(kIdleClients);
   printFigure("threads before and with " + grouped(kIdleClients) + " idle clients",
               std::to_string(threads) + " -> " + std::to_string(threadsNow), std::nullopt,
               Target{"no more", threadsNow <= threads});
@@ -116,7 +117,7 @@ void compareIdleClients(const Options& options) {
   const Card card(1);
   WireSession session(card);
   const std::size_t threads = settledThreads(session.service(), 0);
-  const double kilobytes = session.service().settledKilobytes();
+  const double kilobytes = session.service().process().settledKilobytes();
   const std::string request = unknownMetadata().call();
   const auto count = options.pick<std::size_t>(5'000, 2'000);
   std::vector<double> alone, amongIdle;

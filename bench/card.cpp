@@ -25,17 +25,6 @@ std::size_t folderCount(std::size_t files) { return (files + kFilesPerFolder - 1
 
 std::string folder(std::size_t index) { return "/DCIM/" + std::to_string(kFirstFolder + index) + "ABCDE"; }
 
-std::string name(std::size_t number) {
-  std::array<char, 32> text{};
-  std::snprintf(text.data(), text.size(), "IMG_%04zu.JPG", number);
-  return text.data();
-}
-
-void fillFolder(const std::string& path, std::size_t files, const FileMaker& make) {
-  test::makeFolder(path);
-  for (std::size_t i = 1; i <= files; ++i) make(path + "/" + name(i));
-}
-
 UniqueFd created(const std::string& path) {
   UniqueFd file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
   if (!file) throw std::runtime_error("cannot make " + path);
@@ -65,17 +54,27 @@ FileMaker ofNothing(std::uint64_t size) {
   };
 }
 
-Card::Card(std::size_t files, const std::string& content)
-    : Card(files, [&](const std::string& path) { test::writeFile(path, content); }) {}
+Card::Card(std::size_t files, const std::string& content, const std::string& extension)
+    : Card(
+          files, [&](const std::string& path) { test::writeFile(path, content); }, extension) {}
 
-Card::Card(std::size_t files, const FileMaker& make) : path_(volumes_ / "CARD"), files_(files) {
-  for (std::size_t i = 0; i < folderCount(files); ++i) {
-    fillFolder(path_ + folder(i), std::min(kFilesPerFolder, files - i * kFilesPerFolder), make);
+Card::Card(std::size_t files, const FileMaker& make, const std::string& extension)
+    : path_(volumes_ / "CARD"), files_(files), extension_(extension) {
+  for (std::size_t i = 0; i < files; ++i) {
+    const std::string path = path_ + folder(i / kFilesPerFolder);
+    const std::size_t inFolder = i % kFilesPerFolder;
+    if (inFolder == 0) test::makeFolder(path);
+    make(path + "/" + fileName(inFolder));
   }
 }
 
 std::string Card::firstFolder() { return folder(0); }
-std::string Card::firstName() { return name(1); }
+
+std::string Card::fileName(std::size_t index) const {
+  std::array<char, 32> text{};
+  std::snprintf(text.data(), text.size(), "IMG_%04zu.", index + 1);
+  return text.data() + extension_;
+}
 
 std::size_t Card::objects() const { return kMediaRoots + folderCount(files_) + files_; }
 

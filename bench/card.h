@@ -17,22 +17,25 @@ FileMaker ofBytes(std::uint64_t size);
 /// A file of `size` bytes without a block on the disk: it reads as zeros.
 FileMaker ofNothing(std::uint64_t size);
 
-/// A camera card in a temporary folder: "DCIM/100ABCDE/IMG_0001.JPG" and so on, 999 files in a folder, each
-/// an inode of its own.
+/// A camera card in a temporary folder: "DCIM/100ABCDE/IMG_0001.JPG", or with another extension, and so on,
+/// 999 files in a folder, each an inode of its own.
 class Card {
  public:
   /// A card with `files` files that hold `content`.
-  explicit Card(std::size_t files, const std::string& content = "JPEG");
+  explicit Card(std::size_t files, const std::string& content = "JPEG", const std::string& extension = "JPG");
   /// A card with `files` files made by `make`.
-  Card(std::size_t files, const FileMaker& make);
+  Card(std::size_t files, const FileMaker& make, const std::string& extension = "JPG");
 
   /// The folder above the card, for BRIVOD_VOLUME_FOLDERS.
   const std::string& volumes() const { return volumes_.path(); }
   const std::string& path() const { return path_; }
   /// The path of the first file, and what it is on the card.
-  std::string firstFile() const { return path_ + firstFolder() + "/" + firstName(); }
+  std::string firstFile() const { return filePath(0); }
   static std::string firstFolder();
-  static std::string firstName();
+  std::string firstName() const { return fileName(0); }
+  /// The same of the file with this index in the first folder.
+  std::string filePath(std::size_t index) const { return path_ + firstFolder() + "/" + fileName(index); }
+  std::string fileName(std::size_t index) const;
   std::size_t files() const { return files_; }
   /// Files and folders.
   std::size_t objects() const;
@@ -41,6 +44,7 @@ class Card {
   const test::TemporaryFolder volumes_;
   const std::string path_;
   const std::size_t files_;
+  const std::string extension_;
 };
 
 }  // namespace brivo::bench

@@ -5,6 +5,7 @@
 #include <signal.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -34,6 +35,15 @@ std::vector<std::string> ownEnvironment() {
   return variables;
 }
 
+/// Gives the exit code as exitCodeOf() does.
+int waitFor(pid_t process, rusage& usage) {
+  int status = 0;
+  if (::wait4(process, &status, 0, &usage) != process) {
+    throw std::runtime_error("cannot wait for a process");
+  }
+  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
 std::string contentOf(const UniqueFd& file) {
   return test::readFile("/proc/self/fd/" + std::to_string(file.get()));
 }
@@ -54,18 +64,19 @@ pid_t start(Command command) {
 }
 
 int exitCodeOf(pid_t process) {
-  int status = 0;
-  if (::waitpid(process, &status, 0) != process) throw std::runtime_error("cannot wait for a process");
-  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+  rusage usage{};
+  return waitFor(process, usage);
 }
 
 Outcome run(std::vector<std::string> words) {
   const UniqueFd nowhere(::open("/dev/null", O_WRONLY | O_CLOEXEC));
   const UniqueFd errors(::memfd_create("bench-errors", MFD_CLOEXEC));
+  rusage usage{};
   const Stopwatch watch;
-  const int exitCode = exitCodeOf(start({std::move(words), ownEnvironment(), nowhere.get(), errors.get()}));
+  const int exitCode =
+      waitFor(start({std::move(words), ownEnvironment(), nowhere.get(), errors.get()}), usage);
   const double milliseconds = watch.milliseconds();
-  return {exitCode, milliseconds, contentOf(errors)};
+  return {exitCode, milliseconds, static_cast<double>(usage.ru_maxrss), contentOf(errors)};
 }
 
 Outcome runOrThrow(const std::vector<std::string>& words) {

@@ -30,6 +30,8 @@ int exitCodeOf(pid_t process);
 struct Outcome {
   int exitCode;
   double milliseconds;
+  /// The most memory that was resident, at least as much as this program had when it started the other.
+  double peakKilobytes;
   std::string errors;  ///< what it printed on standard error
 };
 /// Runs a program in this one's environment to its end, with its output dropped.

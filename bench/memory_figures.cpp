@@ -22,15 +22,6 @@ constexpr double kMostForAllReaders = 150;
 constexpr std::size_t kReaders = 10;
 constexpr std::uint64_t kMegabyte = 1'048'576;
 
-/// How far the service's peak rises above its rest while `work` runs, in MiB.
-template <class Work>
-double peakAboveRest(const ServiceProcess& service, Work work) {
-  const double atRest = service.settledKilobytes();
-  service.resetPeak();
-  work();
-  return (service.peakKilobytes() - atRest) / 1024;
-}
-
 /// Of a service that was just started and streams one file without blocks on the disk.
 double peakOfOneReader(std::uint64_t size) {
   const Card card(1, ofNothing(size));
@@ -38,7 +29,7 @@ double peakOfOneReader(std::uint64_t size) {
   session.enumerate();
   session.device().dropSignals();
   ObjectReader reader(session.device(), kFirstFile, size);
-  return peakAboveRest(session.service(), [&] { reader.readStream(); });
+  return peakAboveRest({session.service().process()}, [&] { reader.readStream(); });
 }
 
 // ---------------------------------------------------------------------------------------------- many at a
@@ -77,7 +68,7 @@ double peakOfAllReaders(std::uint64_t size) {
         [&](int socket) { readWhenTold(socket, session.deviceSocket(), kFirstFile + i, size); });
     waitForSignal(readers.back().socket());
   }
-  return peakAboveRest(session.service(), [&] {
+  return peakAboveRest({session.service().process()}, [&] {
     for (const ChildProcess& reader : readers) signalTo(reader.socket());
     for (const ChildProcess& reader : readers) waitForSignal(reader.socket());
   });

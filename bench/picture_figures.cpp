@@ -45,16 +45,17 @@ struct Series {
 
   void addWire() {
     WireSession session(card);
-    const double before = session.service().bytesRead();
+    const double before = session.service().process().bytesRead();
     wire.push_back(session.enumerate());
-    bytesPerFile.push_back((session.service().bytesRead() - before) / static_cast<double>(card.files()));
+    bytesPerFile.push_back((session.service().process().bytesRead() - before) /
+                           static_cast<double>(card.files()));
   }
 
   void addLibrary() {
     RemoteCatalogue catalogue(card);
     library.push_back(catalogue.enumerate().last);
     withSize = catalogue.filesWithSize();
-    kilobytes.push_back(catalogue.service().settledKilobytes());
+    kilobytes.push_back(catalogue.service().process().settledKilobytes());
   }
 
   const Card card;

@@ -6,11 +6,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <cmath>
 #include <filesystem>
-#include <fstream>
 #include <stdexcept>
-#include <thread>
 
 #include "command.h"
 #include "platform/base/unique_fd.h"
@@ -22,16 +19,13 @@ namespace fs = std::filesystem;
 
 namespace {
 
-constexpr std::chrono::milliseconds kLookInterval{100};
-constexpr int kMostLooks = 50;
-constexpr double kUnchangedKilobytes = 64;
-
 fs::path ownProgram() { return fs::read_symlink("/proc/self/exe"); }
 /// The folder of the build that this program belongs to.
 fs::path buildFolder() { return ownProgram().parent_path().parent_path(); }
-std::string builtProgram(const std::string& name) { return buildFolder() / "bin" / name; }
 
 }  // namespace
+
+std::string builtProgram(const std::string& name) { return buildFolder() / "bin" / name; }
 
 ServiceProcess::ServiceProcess(const std::string& volumes) : volumes_(volumes) {
   test::makeFolder(home_ / "data");
@@ -70,39 +64,5 @@ int ServiceProcess::brivoctl(const std::vector<std::string>& arguments) const {
 }
 
 std::string ServiceProcess::log() const { return test::readFile(home_ / "log"); }
-
-std::size_t ServiceProcess::threadCount() const {
-  const fs::directory_iterator tasks("/proc/" + std::to_string(pid_) + "/task");
-  return static_cast<std::size_t>(std::distance(fs::begin(tasks), fs::end(tasks)));
-}
-
-double ServiceProcess::residentKilobytes() const { return numberIn("status", "VmRSS:"); }
-double ServiceProcess::peakKilobytes() const { return numberIn("status", "VmHWM:"); }
-double ServiceProcess::bytesRead() const { return numberIn("io", "rchar:"); }
-
-double ServiceProcess::numberIn(const std::string& file, const std::string& word) const {
-  std::ifstream words("/proc/" + std::to_string(pid_) + "/" + file);
-  for (std::string other; words >> other;) {
-    double number = 0;
-    if (other == word && words >> number) return number;
-  }
-  throw std::runtime_error("brivod has ended: " + log());
-}
-
-void ServiceProcess::resetPeak() const {
-  constexpr const char* kPeakOfResidentMemory = "5";  // proc_pid_clear_refs(5)
-  std::ofstream("/proc/" + std::to_string(pid_) + "/clear_refs") << kPeakOfResidentMemory;
-}
-
-double ServiceProcess::settledKilobytes() const {
-  double last = residentKilobytes();
-  for (int i = 0; i < kMostLooks; ++i) {
-    std::this_thread::sleep_for(kLookInterval);
-    const double now = residentKilobytes();
-    if (std::abs(now - last) < kUnchangedKilobytes) return now;
-    last = now;
-  }
-  return last;
-}
 
 }  // namespace brivo::bench

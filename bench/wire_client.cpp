@@ -49,12 +49,19 @@ std::size_t lengthOf(std::string_view message) {
   return kFixedHeader + aligned(numberAt(message, kFieldsLengthAt), 8) + numberAt(message, kBodyLengthAt);
 }
 
-/// Where the value under `key` lies; throws when it is not there or is not of the type `signature`.
-std::size_t placeOfValue(std::string_view key, std::string_view signature, std::size_t alignment,
-                         std::string_view message) {
-  const std::size_t found = message.find(key);
+/// Where the type of the value under `key` lies, behind its length; the first at or behind `from`. Throws
+/// when the key is not there.
+std::size_t placeOfType(std::string_view key, std::string_view message, std::size_t from = 0) {
+  const std::string entry = test::marshalledString(key);
+  const std::size_t found = message.find(entry, from);
   if (found == std::string_view::npos) throw std::runtime_error("no " + std::string(key) + " in the answer");
-  const std::size_t type = found + key.size() + sizeof '\0' + sizeof(std::uint8_t);  // behind its length
+  return found + entry.size() + sizeof(std::uint8_t);
+}
+
+/// Where the value itself lies; throws also when it is not of the type `signature`.
+std::size_t placeOfValue(std::string_view key, std::string_view signature, std::size_t alignment,
+                         std::string_view message, std::size_t from = 0) {
+  const std::size_t type = placeOfType(key, message, from);
   if (message.substr(type, signature.size()) != signature) {
     throw std::runtime_error(std::string(key) + " in the answer is not " + std::string(signature));
   }
@@ -152,13 +159,22 @@ void WireClient::receiveMore() {
   received_.append(buffer.data(), static_cast<std::size_t>(count));
 }
 
-std::string textUnder(std::string_view key, std::string_view message) {
-  const std::size_t place = placeOfValue(key, "s", sizeof(std::uint32_t), message);
+std::string textUnder(std::string_view key, std::string_view message, std::size_t from) {
+  const std::size_t place = placeOfValue(key, "s", sizeof(std::uint32_t), message, from);
   return std::string(message.substr(place + sizeof(std::uint32_t), numberAt(message, place)));
 }
 
 std::uint64_t numberUnder(std::string_view key, std::string_view message) {
   return longNumberAt(message, placeOfValue(key, "t", sizeof(std::uint64_t), message));
+}
+
+std::string_view bytesUnder(std::string_view key, std::string_view message) {
+  const std::size_t place = placeOfValue(key, "ay", sizeof(std::uint32_t), message);
+  return message.substr(place + sizeof(std::uint32_t), numberAt(message, place));
+}
+
+bool isMemoryUnder(std::string_view key, std::string_view message) {
+  return message.substr(placeOfType(key, message)).starts_with("(ht)");
 }
 
 std::uint64_t memorySizeUnder(std::string_view key, std::string_view message) {

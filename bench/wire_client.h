@@ -57,10 +57,14 @@ class WireClient {
 // What is under a key in a message that holds it as a variant in a dictionary. Each throws when it is not
 // there, or is something else.
 
-/// A text.
-std::string textUnder(std::string_view key, std::string_view message);
+/// A text: the first at or behind the place `from`.
+std::string textUnder(std::string_view key, std::string_view message, std::size_t from = 0);
 /// A number of 64 bits.
 std::uint64_t numberUnder(std::string_view key, std::string_view message);
+/// Bytes; a view into the message.
+std::string_view bytesUnder(std::string_view key, std::string_view message);
+/// Whether what is there came as a descriptor.
+bool isMemoryUnder(std::string_view key, std::string_view message);
 /// How many bytes of a descriptor that came along count.
 std::uint64_t memorySizeUnder(std::string_view key, std::string_view message);
 

@@ -18,9 +18,12 @@ constexpr std::string_view kBeginOfName("I\0M\0G\0_\0", 8);
 }  // namespace
 
 WireSession::WireSession(const Card& card)
+    : WireSession(card, std::make_shared<const ServiceProcess>(card.volumes())) {}
+
+WireSession::WireSession(const Card& card, std::shared_ptr<const ServiceProcess> service)
     : card_(card),
-      service_(card.volumes()),
-      manager_(WireClient::authenticated(service_.managerSocket())),
+      service_(std::move(service)),
+      manager_(WireClient::authenticated(service_->managerSocket())),
       deviceSocket_(openDevice()),
       device_(WireClient::authenticated(deviceSocket_)) {
   device_.call(kDeviceInterface, "requestStartUsingDeviceWithReply");
@@ -28,13 +31,16 @@ WireSession::WireSession(const Card& card)
 
 std::string WireSession::openDevice() {
   std::string devices;
+  std::size_t listed = std::string::npos;
   const auto listsTheCard = [&] {
     devices = manager_.call(kManagerInterface, "requestDeviceListWithReply");
-    return devices.find(card_.path()) != std::string::npos;
+    listed = devices.find(card_.path());
+    return listed != std::string::npos;
   };
   if (!test::waitUntil(listsTheCard)) throw std::runtime_error("no device for " + card_.path());
-  const std::string handle = test::marshalledString(textUnder("OVDeviceHandle", devices));
-  const std::string opened = manager_.call(kManagerInterface, "openDevice_withReply", "s", handle);
+  const std::string handle = textUnder("OVDeviceHandle", devices, listed);  // behind the card's path
+  const std::string opened =
+      manager_.call(kManagerInterface, "openDevice_withReply", "s", test::marshalledString(handle));
   const std::string address = textUnder("OVDeviceEndpoint", opened);
   return address.substr(address.find('/'));
 }

@@ -12,13 +12,16 @@ namespace brivo::bench {
 inline constexpr const char* kManagerInterface = "org.orvid.OVZEPHDeviceManagerProtocol";
 inline constexpr const char* kDeviceInterface = "org.orvid.KorvelProtocol";
 
-/// One card behind a service process that has just been started, opened and started by a WireClient.
+/// One card behind a service process, opened and started by a WireClient.
 class WireSession {
  public:
-  /// `card` must outlive this. Throws when the device cannot be opened.
+  /// Of a service that has just been started for this card. `card` must outlive this. Throws when the device
+  /// cannot be opened.
   explicit WireSession(const Card& card);
+  /// Of a service that serves this card and others.
+  WireSession(const Card& card, std::shared_ptr<const ServiceProcess> service);
 
-  const ServiceProcess& service() const { return service_; }
+  const ServiceProcess& service() const { return *service_; }
   WireClient& device() { return device_; }
   /// Where other processes reach the device.
   const std::string& deviceSocket() const { return deviceSocket_; }
@@ -30,7 +33,7 @@ class WireSession {
   std::string openDevice();
 
   const Card& card_;
-  const ServiceProcess service_;
+  const std::shared_ptr<const ServiceProcess> service_;
   WireClient manager_;
   const std::string deviceSocket_;
   WireClient device_;

@@ -1,0 +1,74 @@
+// SPDX-License-Identifier: MIT
+#include "worker_figures.h"
+
+#include <fcntl.h>
+
+#include <stdexcept>
+#include <vector>
+
+#include "comparison.h"
+#include "figures.h"
+#include "imaging/local_image_decoder.h"
+#include "imaging/made_pictures.h"
+#include "object_reader.h"
+#include "photo.h"
+#include "platform/decoding/imaging_service.h"
+#include "service_process.h"
+#include "support/temporary_folder.h"
+
+namespace brivo::bench {
+
+namespace {
+
+constexpr unsigned kPixels = 1024;
+constexpr double kMostToDecoder = 1.03;
+constexpr unsigned kTiny = 16;
+
+WorkerOptions builtWorker() {
+  WorkerOptions options;
+  options.program = builtProgram("brivod-imaging");
+  return options;
+}
+
+void takeThumbnail(ImageDecoder& decoder, const std::string& path, unsigned pixels) {
+  const UniqueFd file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  const auto thumbnail = decoder.thumbnail(file, {.maximumPixelSize = pixels});
+  if (!thumbnail) throw std::runtime_error("no thumbnail of " + path);
+  touch(thumbnail->bytes());
+}
+
+void compareDecoders(const std::string& photo, const Options& options) {
+  ImagingService service(builtWorker());
+  LocalImageDecoder local;
+  const auto timeOf = [&](ImageDecoder& decoder) {
+    return millisecondsOf([&] { takeThumbnail(decoder, photo, kPixels); });
+  };
+  printComparison(
+      "thumbnail of 1,024 pixels by a worker", [&] { return timeOf(service); },
+      {{"the same decoder in this process", [&] { return timeOf(local); }, kMostToDecoder}},
+      options.pick(31, 5));
+}
+
+void printTimeOfStart(const std::string& tiny, const Options& options) {
+  std::vector<double> times;
+  for (int i = 0; i < options.pick(31, 5); ++i) {
+    times.push_back(millisecondsOf([&] {
+      ImagingService service(builtWorker());
+      takeThumbnail(service, tiny, kTiny);
+    }));
+  }
+  printFigure("start of a worker up to its first thumbnail", inMilliseconds(median(times)));
+}
+
+}  // namespace
+
+void printWorkerFigures(const Options& options) {
+  const test::TemporaryFolder folder;
+  const std::string photo = folder / "photo.jpg", tiny = folder / "tiny.jpg";
+  test::writeFile(photo, makePhoto());
+  test::writeFile(tiny, test::madeJpeg(kTiny, kTiny));
+  compareDecoders(photo, options);
+  printTimeOfStart(tiny, options);
+}
+
+}  // namespace brivo::bench

@@ -41,6 +41,7 @@ expected() {
     include/orvidcore/platform/base/{data,result,shared_buffer,url,value}.h \
     "$libdir"/cmake/OrvidCore/OrvidCore{Config,ConfigVersion,Targets,Targets-CONFIG}.cmake \
     "$libdir"/libOrvidCore.so{,.0,".$version"} "$libdir/pkgconfig/orvidcore.pc" \
+    libexec/brivod/brivod-imaging \
     share/OrvidCore/DeviceMatchingInfo.plist share/applications/org.orvid.Photos.desktop
 }
 check "exactly the files that belong there" diff <(expected | sort) <(installed | sort)

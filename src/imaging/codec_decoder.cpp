@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: MIT
 #include <array>
-#include <ranges>
 #include <string>
 #include <string_view>
 
@@ -84,8 +83,9 @@ bool isTaller(const AVFrame& frame, std::uint32_t pixels) {
 Frame chosenPage(std::vector<std::byte>& file, const ThumbnailRequest& request) {
   Frame first = decodeFile(AV_CODEC_ID_TIFF, file);
   if (!request.imageTallerThan || (first && isTaller(*first, *request.imageTallerThan))) return first;
-  for (const std::uint32_t page : pagesOf(file) | std::views::drop(1)) {
-    Frame next = decodePage(file, page);
+  const std::vector<std::uint32_t> pages = pagesOf(file);
+  for (std::size_t i = 1; i < pages.size(); ++i) {
+    Frame next = decodePage(file, pages[i]);
     if (next && isTaller(*next, *request.imageTallerThan)) return next;
   }
   return first;

@@ -6,6 +6,7 @@ extern "C" {
 }
 
 #include <algorithm>
+#include <cstring>
 #include <limits>
 
 namespace brivo::imaging {
@@ -32,6 +33,13 @@ void unifyFormat(AVFrame& frame) {
   if (frame.format == AV_PIX_FMT_YUVJ420P) makeFullRange(AV_PIX_FMT_YUV420P);
   if (frame.format == AV_PIX_FMT_YUVJ422P) makeFullRange(AV_PIX_FMT_YUV422P);
   if (frame.format == AV_PIX_FMT_YUVJ444P) makeFullRange(AV_PIX_FMT_YUV444P);
+}
+
+/// Bit streams may state a matrix that no one knows, and the codecs put it into the enumeration as it is.
+void forgetUnknownMatrix(AVFrame& frame) {
+  int matrix = AVCOL_SPC_UNSPECIFIED;
+  std::memcpy(&matrix, &frame.colorspace, sizeof matrix);
+  if (matrix < 0 || matrix >= AVCOL_SPC_NB) frame.colorspace = AVCOL_SPC_UNSPECIFIED;
 }
 
 }  // namespace
@@ -77,6 +85,7 @@ Frame Codec::decode(const AVPacket& packet) {
   const auto width = static_cast<std::uint64_t>(frame->width);
   if (!isWithinLimits(width, static_cast<std::uint64_t>(frame->height))) return nullptr;
   unifyFormat(*frame);
+  forgetUnknownMatrix(*frame);
   return frame;
 }
 

@@ -29,7 +29,7 @@ Packet packetOf(std::span<const std::byte> bytes);
 /// How much of the decoding is worth its time.
 enum class Care {
   exact,    ///< as the standard of the codec has it
-  reduced,  ///< without smoothing the borders of blocks: not seen in a picture that is scaled down to a half
+  reduced,  ///< without smoothing the borders of blocks: not seen in a picture that is scaled down to a third
 };
 
 /// Decodes pictures that share one configuration, each of them whole in itself. Makes no threads.

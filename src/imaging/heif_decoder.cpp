@@ -87,7 +87,7 @@ class Decoding {
   std::optional<Picture> decode(HeifPicture picture) {
     if (picture.type == fourCharacters("jpeg")) return decodeJpegItem(picture);
     const std::uint32_t wanted = request_.maximumPixelSize;
-    if (wanted != 0 && longerSide(picture.size) / 2 >= wanted) care_ = Care::reduced;
+    if (wanted != 0 && longerSide(picture.size) / 3 >= wanted) care_ = Care::reduced;
     Frame frame = picture.type == kGrid ? decodeGrid(picture) : decodeCoded(picture);
     if (!frame) return std::nullopt;
     setColours(*frame, picture.colours);

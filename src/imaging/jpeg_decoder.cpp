@@ -137,12 +137,14 @@ class Decoder {
   }
 
   /// Eighths by which the transform itself makes the picture smaller. Its filter is coarse, so that it leaves
-  /// something to do for the scaler, whose is not.
+  /// something to do for the scaler, whose is not: much where that costs little.
   void scaleDown(std::uint32_t maximum) {
+    constexpr std::uint32_t kSmall = 512;
     const Extent image{codec_.image_width, codec_.image_height};
     const Extent wanted = fitted(image, maximum);
-    const auto covers = [](std::uint64_t side, unsigned eighths, std::uint64_t least) {
-      return side * eighths * 3 >= least * DCTSIZE * 4;
+    const std::uint64_t thirds = std::max(wanted.width, wanted.height) <= kSmall ? 6 : 4;
+    const auto covers = [thirds](std::uint64_t side, unsigned eighths, std::uint64_t least) {
+      return side * eighths * 3 >= least * DCTSIZE * thirds;
     };
     unsigned eighths = 1;
     while (eighths < DCTSIZE &&

@@ -8,6 +8,9 @@
 
 #include <array>
 #include <cstddef>
+#include <filesystem>
+#include <fstream>
+#include <span>
 
 #include "imaging/decode_request.h"
 #include "iso_bytes.h"
@@ -384,6 +387,17 @@ TEST(HeifDecoder, NoByteThatIsDifferentLeadsBeyondTheLimits) {
       EXPECT_LE(picture->frame->height, 128);
     }
   }
+}
+
+TEST(HeifDecoderTest, AMatrixThatNoOneKnowsIsNotTaken) {
+  // The coded picture states matrix 38, which ITU-T H.273 reserves.
+  std::ifstream file(std::filesystem::path(BRIVOD_SOURCE_DIR) / "fuzz/seeds/decode_heif/unknown_matrix",
+                     std::ios::binary);
+  const std::string bytes{std::istreambuf_iterator<char>(file), {}};
+  ASSERT_FALSE(bytes.empty());
+  const auto picture = decodeHeif(images::MemorySource(std::as_bytes(std::span(bytes))), {});
+  ASSERT_TRUE(picture);
+  EXPECT_EQ(picture->frame->colorspace, AVCOL_SPC_SMPTE170M);
 }
 
 }  // namespace

@@ -56,8 +56,8 @@ class SheetLayout {
   std::uint64_t gap() const { return options_.tile / 8 + 4; }
   std::uint64_t margin() const { return options_.tile / 5 + 8; }
   std::uint64_t captionGap() const { return options_.tile / 40 + 2; }
-  std::uint64_t captionHeight() const { return captionLetters() * 3 / 2; }
-  std::uint64_t headingHeight() const { return headingLetters() * 2; }
+  std::uint64_t captionHeight() const { return std::uint64_t{captionLetters()} * 3 / 2; }
+  std::uint64_t headingHeight() const { return std::uint64_t{headingLetters()} * 2; }
   std::uint64_t addHeading(std::uint64_t y);
   std::uint64_t addTiles(std::size_t count, std::uint64_t y);
 

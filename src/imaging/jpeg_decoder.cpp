@@ -71,7 +71,7 @@ class Input {
   const images::ByteSource& source_;
   std::uint64_t next_ = 0;
   bool hasEnded_ = false;
-  std::array<JOCTET, kPiece> piece_;
+  std::array<JOCTET, kPiece> piece_{};
 };
 
 /// Pixel format of planes whose chroma is `across` times narrower and `down` times lower than luma.
@@ -89,7 +89,7 @@ class Decoder {
   explicit Decoder(const images::ByteSource& source) : input_(source) { codec_.err = prepare(errors_); }
   ~Decoder() {
     jpeg_destroy_decompress(&codec_);
-    std::free(profile_);
+    std::free(profile_);  // NOLINT(cppcoreguidelines-no-malloc): as the library allocates it
   }
   Decoder(const Decoder&) = delete;
   Decoder& operator=(const Decoder&) = delete;
@@ -239,7 +239,7 @@ class Decoder {
       std::array<JSAMPARRAY, kPlanes> planes{};
       for (int i = 0; i < codec_.num_components; ++i) {
         const jpeg_component_info& part = codec_.comp_info[i];
-        const auto height = static_cast<std::size_t>(part.v_samp_factor * part.DCT_scaled_size);
+        const std::size_t height = static_cast<unsigned>(part.v_samp_factor * part.DCT_scaled_size);
         planes[static_cast<std::size_t>(i)] =
             const_cast<JSAMPARRAY>(&rows[static_cast<std::size_t>(i)][strip * height]);
       }

@@ -85,7 +85,7 @@ class Destination {
   }
 
   jpeg_destination_mgr manager_{};  // first: the library knows this part alone
-  std::array<JOCTET, kPiece> piece_;
+  std::array<JOCTET, kPiece> piece_{};
   std::vector<std::byte> bytes_;
 };
 

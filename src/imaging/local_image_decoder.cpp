@@ -16,7 +16,6 @@ extern "C" {
 namespace brivo {
 
 using imaging::Extent;
-using imaging::Picture;
 
 namespace {
 

@@ -44,7 +44,7 @@ class RawStream final : public LibRaw_abstract_datastream {
   std::uint64_t position_ = 0;  ///< never behind the end
   std::uint64_t windowStart_ = 0;
   std::size_t windowLength_ = 0;
-  std::array<std::byte, 16'384> window_;
+  std::array<std::byte, 16'384> window_{};
 };
 
 }  // namespace brivo::imaging

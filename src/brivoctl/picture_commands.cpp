@@ -170,14 +170,15 @@ std::optional<ExitCode> refused(const SheetLayout& layout, SheetFormat format) {
   return std::nullopt;
 }
 
-/// False when there is nothing to be shown of the object.
-bool drawAnswer(ContactSheet& sheet, const ThumbnailStream::Answer& answer) {
+/// False when there is nothing to be shown of the object. Where no orientation comes with the thumbnail, the
+/// catalogue's holds.
+bool drawAnswer(ContactSheet& sheet, const ThumbnailStream::Answer& answer, const orvid::ObjectInfo& info) {
   const auto bytes = answer.reply.ok() ? thumbnailIn(*answer.reply) : std::span<const std::byte>();
   if (bytes.empty()) {
     sheet.drawNeutral(answer.index, "no thumbnail");
     return false;
   }
-  const auto orientation = answer.reply->unsignedInteger(kOrientationKey).value_or(1);
+  const auto orientation = answer.reply->unsignedInteger(kOrientationKey).value_or(info.orientation);
   if (sheet.drawPicture(answer.index, bytes, orientation)) return true;
   sheet.drawNeutral(answer.index, "damaged thumbnail");
   return false;
@@ -197,8 +198,9 @@ Selected<std::size_t> draw(ContactSheet& sheet, const Shown& all, const SheetOpt
       progress.erase();
       return report(answer->reply.error());
     }
-    const std::string name = shown(all.objects[answer->index].info().name);
-    missing += drawAnswer(sheet, *answer) ? 0 : 1;
+    const orvid::ObjectInfo& info = all.objects[answer->index].info();
+    const std::string name = shown(info.name);
+    missing += drawAnswer(sheet, *answer, info) ? 0 : 1;
     sheet.drawCaption(answer->index, name);
     const double share = static_cast<double>(done) / static_cast<double>(all.objects.size());
     if (progress.isDue()) progress.show(name, share, fmt::format("{} of {}", done, all.objects.size()));

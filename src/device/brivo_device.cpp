@@ -208,6 +208,7 @@ void BrivoDevice::requestMetadataForObjectHandle(std::uint64_t handle, Dictionar
 void BrivoDevice::requestThumbnailDataForObjectHandle(std::uint64_t handle, Dictionary options,
                                                       ResultHandler reply) {
   addObjectRequest([this, handle, options = std::move(options), reply = std::move(reply)] {
+    const LogBurst lines;  // most requests of a client, and each logs several
     requests_.requestThumbnailDataForObjectHandle(handle, options, reply);
   });
 }

@@ -9,10 +9,10 @@
 #include <stdexcept>
 #include <vector>
 
+#include "camera_picture.h"
 #include "comparison.h"
 #include "echo_process.h"
 #include "figures.h"
-#include "imaging/made_pictures.h"
 #include "object_reader.h"
 #include "photo.h"
 #include "thumbnail_client.h"
@@ -28,7 +28,6 @@ namespace {
 constexpr double kMostToLibgphoto2 = 0.25;
 constexpr double kMostToBareLoop = 2;
 constexpr unsigned kPixels = 160;
-constexpr unsigned kOrientation = 6;
 constexpr std::size_t kPictures = 500;
 
 /// Pictures with thumbnails behind the service, and others that read them.
@@ -36,7 +35,7 @@ class PicturesWithThumbnails {
  public:
   PicturesWithThumbnails()
       : thumbnail_(makePhoto(kPixels, 120)),
-        picture_(test::withExifThumbnail(makePhoto(640, 480), thumbnail_, kOrientation)),
+        picture_(withCameraExif(makePhoto(640, 480), thumbnail_)),
         card_(kPictures, picture_),
         session_(card_) {
     session_.enumerate();

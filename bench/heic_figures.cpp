@@ -18,16 +18,12 @@ namespace brivo::bench {
 namespace {
 
 constexpr unsigned kThumbnailItem = 320;
-constexpr double kMostToHeifThumbnailer = 0.7;
 constexpr unsigned kLarge = 1024;
-constexpr double kMostToHeifThumbnailerOfPicture = 0.65;
+constexpr double kMostToThumbnailerOfItem = 0.7;
+constexpr double kMostToThumbnailerOfPicture = 0.65;
 
-/// A file of heif-enc with a thumbnail item; none, with a note, where that is not installed.
-std::optional<std::string> makeHeic(const Options& options) {
-  if (!isInstalled("heif-enc")) {
-    printNote("no HEIC picture: heif-enc is not installed");
-    return std::nullopt;
-  }
+/// A file of heif-enc with a thumbnail item.
+std::string makeHeic(const Options& options) {
   const test::TemporaryFolder folder;
   const std::string photo = folder / "photo.jpg", heic = folder / "photo.heic";
   test::writeFile(photo, makePhoto(4000, 3000));
@@ -37,38 +33,59 @@ std::optional<std::string> makeHeic(const Options& options) {
   return test::readFile(heic);
 }
 
-double timeOfHeifThumbnailer(std::vector<std::string> options, const std::string& picture) {
-  const test::TemporaryFolder folder;
-  std::vector<std::string> words{"heif-thumbnailer"};
-  words.insert(words.end(), options.begin(), options.end());
-  words.insert(words.end(), {picture, folder / "made.png"});
-  return runOrThrow(words).milliseconds;
+/// It behind the service.
+class HeicPicture {
+ public:
+  explicit HeicPicture(const Options& options) : card_(1, makeHeic(options), "HEIC"), session_(card_) {
+    session_.enumerate();
+    session_.device().dropSignals();
+    for (const unsigned pixels : {kThumbnailItem, kLarge})
+      checkThumbnail(session_.device(), kFirstFile, pixels);
+  }
+
+  double timeOfService(unsigned pixels) { return timeOfThumbnail(session_.device(), kFirstFile, pixels); }
+  /// Of the thumbnail item, when there is one.
+  double timeOfThumbnailer(unsigned pixels) const {
+    return timeOf({"heif-thumbnailer", "-s", std::to_string(pixels)});
+  }
+  /// Of the picture itself.
+  double timeOfThumbnailerOfPicture(unsigned pixels) const {
+    return timeOf({"heif-thumbnailer", "-p", "-s", std::to_string(pixels)});
+  }
+
+ private:
+  double timeOf(std::vector<std::string> words) const {
+    const test::TemporaryFolder folder;
+    words.insert(words.end(), {card_.firstFile(), folder / "made.png"});
+    return runOrThrow(words).milliseconds;
+  }
+
+  const Card card_;
+  WireSession session_;
+};
+
+void compare(HeicPicture& picture, unsigned pixels, const std::optional<Rival>& rival,
+             const Options& options) {
+  printComparison(
+      "thumbnail of " + grouped(pixels) + " pixels of a HEIC of 12 megapixels",
+      [&] { return picture.timeOfService(pixels); }, rival ? std::vector{*rival} : std::vector<Rival>(),
+      options.pick(9, 3));
 }
 
 }  // namespace
 
 void printHeicFigures(const Options& options) {
-  const auto picture = makeHeic(options);
-  if (!picture) return;
-  const Card card(1, *picture, "HEIC");
-  WireSession session(card);
-  session.enumerate();
-  session.device().dropSignals();
-  const bool hasPeer = canCompareWith("heif-thumbnailer");
-  const auto compare = [&](unsigned pixels, const std::string& what, std::vector<std::string> peerOptions,
-                           double most) {
-    checkThumbnail(session.device(), kFirstFile, pixels);
-    std::vector<Rival> rivals;
-    if (hasPeer)
-      rivals.push_back({"heif-thumbnailer" + what,
-                        [&, peerOptions] { return timeOfHeifThumbnailer(peerOptions, card.firstFile()); },
-                        most});
-    printComparison(
-        "thumbnail of " + grouped(pixels) + " pixels of a HEIC of 12 megapixels",
-        [&] { return timeOfThumbnail(session.device(), kFirstFile, pixels); }, rivals, options.pick(9, 3));
-  };
-  compare(kThumbnailItem, "", {"-s", std::to_string(kThumbnailItem)}, kMostToHeifThumbnailer);
-  compare(kLarge, " -p", {"-p", "-s", std::to_string(kLarge)}, kMostToHeifThumbnailerOfPicture);
+  if (!isInstalled("heif-enc")) return printNote("no HEIC picture: heif-enc is not installed");
+  HeicPicture picture(options);
+  std::optional<Rival> ofItem, ofPicture;
+  if (canCompareWith("heif-thumbnailer")) {
+    ofItem = Rival{"heif-thumbnailer", [&] { return picture.timeOfThumbnailer(kThumbnailItem); },
+                   kMostToThumbnailerOfItem};
+    ofPicture = Rival{"heif-thumbnailer -p", [&] { return picture.timeOfThumbnailerOfPicture(kLarge); },
+                      kMostToThumbnailerOfPicture};
+  }
+  compare(picture, kThumbnailItem, ofItem, options);
+  compare(picture, kLarge, ofPicture, options);
 }
 
 }  // namespace brivo::bench

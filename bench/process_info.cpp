@@ -8,6 +8,8 @@
 #include <stdexcept>
 #include <thread>
 
+#include "support/processes.h"
+
 namespace brivo::bench {
 
 namespace fs = std::filesystem;
@@ -26,15 +28,14 @@ double sumOf(const std::vector<ProcessInfo>& processes, double (ProcessInfo::*ki
 }  // namespace
 
 std::size_t ProcessInfo::threadCount() const {
-  const fs::directory_iterator tasks(folder_ + "/task");
+  const fs::directory_iterator tasks(pathOf("task"));
   return static_cast<std::size_t>(std::distance(fs::begin(tasks), fs::end(tasks)));
 }
 
 std::vector<ProcessInfo> ProcessInfo::children() const {
   std::vector<ProcessInfo> children;
-  for (const auto& task : fs::directory_iterator(folder_ + "/task")) {
-    std::ifstream words(task.path() / "children");
-    for (pid_t child = 0; words >> child;) children.emplace_back(child);
+  for (const pid_t child : test::childrenOf(process_)) {
+    if (test::isRunning(child)) children.emplace_back(child);
   }
   return children;
 }
@@ -44,7 +45,7 @@ double ProcessInfo::peakKilobytes() const { return numberIn("status", "VmHWM:");
 double ProcessInfo::bytesRead() const { return numberIn("io", "rchar:"); }
 
 double ProcessInfo::numberIn(const std::string& file, const std::string& word) const {
-  std::ifstream words(folder_ + "/" + file);
+  std::ifstream words(pathOf(file));
   for (std::string other; words >> other;) {
     double number = 0;
     if (other == word && words >> number) return number;
@@ -52,9 +53,13 @@ double ProcessInfo::numberIn(const std::string& file, const std::string& word) c
   throw std::runtime_error("a process that is measured has ended");
 }
 
+std::string ProcessInfo::pathOf(const std::string& file) const {
+  return "/proc/" + std::to_string(process_) + "/" + file;
+}
+
 void ProcessInfo::resetPeak() const {
   constexpr const char* kPeakOfResidentMemory = "5";  // proc_pid_clear_refs(5)
-  std::ofstream(folder_ + "/clear_refs") << kPeakOfResidentMemory;
+  std::ofstream(pathOf("clear_refs")) << kPeakOfResidentMemory;
 }
 
 double ProcessInfo::settledKilobytes() const {

@@ -12,7 +12,7 @@ namespace brivo::bench {
 /// What /proc tells of a process. Every function throws when the process has ended.
 class ProcessInfo {
  public:
-  explicit ProcessInfo(pid_t process) : folder_("/proc/" + std::to_string(process)) {}
+  explicit ProcessInfo(pid_t process) : process_(process) {}
 
   std::size_t threadCount() const;
   /// Its children that have not ended.
@@ -34,7 +34,9 @@ class ProcessInfo {
   /// A number in one of the files, by the word before it.
   double numberIn(const std::string& file, const std::string& word) const;
 
-  std::string folder_;
+  std::string pathOf(const std::string& file) const;
+
+  pid_t process_;
 };
 
 /// How far the peaks of these processes together rise above their rest while `work` runs, in MiB.

@@ -1,20 +1,17 @@
 // SPDX-License-Identifier: MIT
 #include "worker_figures.h"
 
-#include <fcntl.h>
-
 #include <stdexcept>
 #include <vector>
 
 #include "comparison.h"
 #include "figures.h"
 #include "imaging/local_image_decoder.h"
-#include "imaging/made_pictures.h"
 #include "object_reader.h"
 #include "photo.h"
 #include "platform/decoding/imaging_service.h"
 #include "service_process.h"
-#include "support/temporary_folder.h"
+#include "support/open_file.h"
 
 namespace brivo::bench {
 
@@ -30,14 +27,13 @@ WorkerOptions builtWorker() {
   return options;
 }
 
-void takeThumbnail(ImageDecoder& decoder, const std::string& path, unsigned pixels) {
-  const UniqueFd file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+void takeThumbnail(ImageDecoder& decoder, const UniqueFd& file, unsigned pixels) {
   const auto thumbnail = decoder.thumbnail(file, {.maximumPixelSize = pixels});
-  if (!thumbnail) throw std::runtime_error("no thumbnail of " + path);
+  if (!thumbnail) throw std::runtime_error("no thumbnail of a picture");
   touch(thumbnail->bytes());
 }
 
-void compareDecoders(const std::string& photo, const Options& options) {
+void compareDecoders(const UniqueFd& photo, const Options& options) {
   ImagingService service(builtWorker());
   LocalImageDecoder local;
   const auto timeOf = [&](ImageDecoder& decoder) {
@@ -49,7 +45,7 @@ void compareDecoders(const std::string& photo, const Options& options) {
       options.pick(31, 5));
 }
 
-void printTimeOfStart(const std::string& tiny, const Options& options) {
+void printTimeOfStart(const UniqueFd& tiny, const Options& options) {
   std::vector<double> times;
   for (int i = 0; i < options.pick(31, 5); ++i) {
     times.push_back(millisecondsOf([&] {
@@ -63,12 +59,8 @@ void printTimeOfStart(const std::string& tiny, const Options& options) {
 }  // namespace
 
 void printWorkerFigures(const Options& options) {
-  const test::TemporaryFolder folder;
-  const std::string photo = folder / "photo.jpg", tiny = folder / "tiny.jpg";
-  test::writeFile(photo, makePhoto());
-  test::writeFile(tiny, test::madeJpeg(kTiny, kTiny));
-  compareDecoders(photo, options);
-  printTimeOfStart(tiny, options);
+  compareDecoders(test::fileWith(makePhoto()), options);
+  printTimeOfStart(test::fileWith(makePhoto(kTiny, kTiny)), options);
 }
 
 }  // namespace brivo::bench

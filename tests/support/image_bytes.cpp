@@ -14,7 +14,7 @@ constexpr std::uint16_t kByte = 1, kAscii = 2, kShort = 3, kLong = 4, kRational 
 
 std::string integer(std::uint64_t value, std::size_t width, std::endian order) {
   std::string text;
-  for (std::size_t i = 0; i < width; ++i) text += static_cast<char>(value >> 8 * i & 0xFF);
+  for (std::size_t i = 0; i < width; ++i, value >>= 8) text += static_cast<char>(value & 0xFF);
   if (order == std::endian::big) std::ranges::reverse(text);
   return text;
 }

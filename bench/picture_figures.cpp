@@ -53,14 +53,14 @@ struct Series {
 
   void addLibrary() {
     RemoteCatalogue catalogue(card);
-    library.push_back(catalogue.enumerate().last);
+    throughLibrary.push_back(catalogue.enumerate().last);
     withSize = catalogue.filesWithSize();
     kilobytes.push_back(catalogue.service().process().settledKilobytes());
   }
 
   const Card card;
   const std::vector<PicturePeer> peers;
-  std::vector<double> bare, wire, library, bytesPerFile, kilobytes;
+  std::vector<double> bare, wire, throughLibrary, bytesPerFile, kilobytes;
   std::vector<std::vector<double>> ofPeers;
   std::size_t withSize = 0;
 };
@@ -74,14 +74,14 @@ void printTime(const std::string& what, const std::vector<double>& times, const 
 void printTimes(const Series& series) {
   printFigure("bare reads, " + picturesOf(series.card), inMilliseconds(median(series.bare)), 1);
   printTime("catalogue, client only reads", series.wire, series);
-  printTime("catalogue, OrvidCore", series.library, series);
+  printTime("catalogue, OrvidCore", series.throughLibrary, series);
   const double told = static_cast<double>(series.withSize) / static_cast<double>(series.card.files());
   printFigure("pictures that are told of with their size", grouped(series.withSize), told, atLeast(1, told));
 }
 
 void printPeers(const Series& series) {
   for (std::size_t i = 0; i < series.peers.size(); ++i) {
-    const double ratio = medianRatio(series.library, series.ofPeers[i]);
+    const double ratio = medianRatio(series.throughLibrary, series.ofPeers[i]);
     const auto most = series.peers[i].mostRatio;
     printFigure("catalogue to " + series.peers[i].name, inMilliseconds(median(series.ofPeers[i])), ratio,
                 most ? std::optional(atMost(*most, ratio)) : std::nullopt);
@@ -90,14 +90,14 @@ void printPeers(const Series& series) {
 
 void printExiftool(const Series& series, const PicturePeer& exiftool) {
   const double time = millisecondsOf([&] { exiftool.read(series.card.path()); });
-  const double ratio = time / median(series.library);
+  const double ratio = time / median(series.throughLibrary);
   printFigure(exiftool.name + " to catalogue, " + picturesOf(series.card), inMilliseconds(time), ratio,
               atLeast(kLeastTimesFasterThanExiftool, ratio));
 }
 
 void printGrowth(const Series& small, const Series& large) {
   const double times = static_cast<double>(large.card.files()) / static_cast<double>(small.card.files());
-  const double growth = median(large.library) / median(small.library) / times;
+  const double growth = median(large.throughLibrary) / median(small.throughLibrary) / times;
   printFigure("growth against linear", inUnits(times, "x pictures"), growth,
               within(kLeastGrowth, kMostGrowth, growth));
 }

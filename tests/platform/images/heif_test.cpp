@@ -4,6 +4,7 @@
 #include <array>
 
 #include "bounded.h"
+#include "exif_bytes.h"
 #include "iso_bytes.h"
 #include "platform/images/heif_items.h"
 #include "reading.h"
@@ -23,16 +24,7 @@ using test::TiffBytes;
 using test::turn;
 
 std::string exifBlock(unsigned orientation = 6) {
-  TiffBytes tiff(std::endian::big);
-  tiff.beginDirectory();
-  tiff.ascii(0x010F, "Maker");
-  tiff.shorts(0x0112, {orientation});
-  tiff.directory(0x8769, 1);
-  tiff.beginDirectory();
-  tiff.ascii(0x9003, "2021:06:01 10:00:00");
-  tiff.link(0, tiff.beginDirectory());
-  tiff.placed(0x0201, 0x0202, jpeg(160, 120));
-  return tiff.build();
+  return test::exifWithThumbnail(std::endian::big, orientation);
 }
 
 /// A picture of 4000 × 3000 with EXIF and a thumbnail that is a JPEG.

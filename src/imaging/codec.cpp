@@ -35,11 +35,19 @@ void unifyFormat(AVFrame& frame) {
   if (frame.format == AV_PIX_FMT_YUVJ444P) makeFullRange(AV_PIX_FMT_YUV444P);
 }
 
-/// Bit streams may state a matrix that no one knows, and the codecs put it into the enumeration as it is.
-void forgetUnknownMatrix(AVFrame& frame) {
-  int matrix = AVCOL_SPC_UNSPECIFIED;
-  std::memcpy(&matrix, &frame.colorspace, sizeof matrix);
-  if (matrix < 0 || matrix >= AVCOL_SPC_NB) frame.colorspace = AVCOL_SPC_UNSPECIFIED;
+/// Bit streams may state codes that no one knows, and the codecs put them into the enumerations as they are.
+template <class Code>
+void forgetUnknown(Code& code, Code end, Code unspecified) {
+  int value = 0;
+  static_assert(sizeof value == sizeof code);
+  std::memcpy(&value, &code, sizeof value);
+  if (value < 0 || value >= end) code = unspecified;
+}
+
+void forgetUnknownColours(AVFrame& frame) {
+  forgetUnknown(frame.colorspace, AVCOL_SPC_NB, AVCOL_SPC_UNSPECIFIED);
+  forgetUnknown(frame.color_primaries, AVCOL_PRI_NB, AVCOL_PRI_UNSPECIFIED);
+  forgetUnknown(frame.color_trc, AVCOL_TRC_NB, AVCOL_TRC_UNSPECIFIED);
 }
 
 }  // namespace
@@ -85,7 +93,7 @@ Frame Codec::decode(const AVPacket& packet) {
   const auto width = static_cast<std::uint64_t>(frame->width);
   if (!isWithinLimits(width, static_cast<std::uint64_t>(frame->height))) return nullptr;
   unifyFormat(*frame);
-  forgetUnknownMatrix(*frame);
+  forgetUnknownColours(*frame);
   return frame;
 }
 

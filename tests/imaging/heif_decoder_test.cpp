@@ -389,15 +389,21 @@ TEST(HeifDecoder, NoByteThatIsDifferentLeadsBeyondTheLimits) {
   }
 }
 
-TEST(HeifDecoderTest, AMatrixThatNoOneKnowsIsNotTaken) {
-  // The coded picture states matrix 38, which ITU-T H.273 reserves.
-  std::ifstream file(std::filesystem::path(BRIVOD_SOURCE_DIR) / "fuzz/seeds/decode_heif/unknown_matrix",
+std::optional<Picture> decodeSeed(const char* name) {
+  std::ifstream file(std::filesystem::path(BRIVOD_SOURCE_DIR) / "fuzz/seeds/decode_heif" / name,
                      std::ios::binary);
   const std::string bytes{std::istreambuf_iterator<char>(file), {}};
-  ASSERT_FALSE(bytes.empty());
-  const auto picture = decodeHeif(images::MemorySource(std::as_bytes(std::span(bytes))), {});
-  ASSERT_TRUE(picture);
-  EXPECT_EQ(picture->frame->colorspace, AVCOL_SPC_SMPTE170M);
+  return decodeHeif(images::MemorySource(std::as_bytes(std::span(bytes))), {});
+}
+
+TEST(HeifDecoderTest, ColoursThatNoOneKnowsAreNotTaken) {
+  // The coded pictures state matrix 38 and primaries 127, which ITU-T H.273 reserves.
+  const auto matrix = decodeSeed("unknown_matrix");
+  ASSERT_TRUE(matrix);
+  EXPECT_EQ(matrix->frame->colorspace, AVCOL_SPC_SMPTE170M);
+  const auto primaries = decodeSeed("unknown_primaries");
+  ASSERT_TRUE(primaries);
+  EXPECT_NE(static_cast<int>(primaries->frame->color_primaries), 127);
 }
 
 }  // namespace

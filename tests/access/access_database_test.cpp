@@ -7,10 +7,14 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <ctime>
+#include <thread>
 
+#include "support/processes.h"
 #include "support/standard_error.h"
 #include "support/temporary_folder.h"
+#include "support/wait.h"
 
 namespace brivo {
 namespace {
@@ -170,12 +174,14 @@ TEST_F(AccessDatabaseTest, ALockedFileIsWaitedFor) {
   const auto database = open();
   const auto other = plain();
   ASSERT_FALSE(other->execute("BEGIN EXCLUSIVE"));
-  std::thread release([&] {
-    std::this_thread::sleep_for(std::chrono::milliseconds(100));
-    EXPECT_FALSE(other->execute("COMMIT"));
+  std::atomic<pid_t> adding = 0;
+  std::thread add([&] {
+    adding = ::gettid();
+    database->addApplicationWithBundleIdentifier("org.example.App", true);
   });
-  database->addApplicationWithBundleIdentifier("org.example.App", true);
-  release.join();
+  EXPECT_TRUE(test::waitUntil([&] { return adding != 0 && test::isBlocked(adding); }));
+  EXPECT_FALSE(other->execute("COMMIT"));
+  add.join();
   EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
 }
 

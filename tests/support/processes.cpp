@@ -48,7 +48,7 @@ bool isRunning(pid_t process) {
   return status && status->state != 'Z' && status->state != 'X';
 }
 
-bool isAsleep(pid_t thread) {
+bool isBlocked(pid_t thread) {
   const auto status = statusOf("/proc/" + std::to_string(thread));
   return status && status->state == 'S';
 }

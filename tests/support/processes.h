@@ -12,6 +12,6 @@ std::vector<pid_t> childrenOf(pid_t process);
 /// False for one that has ended, whether or not it is reaped.
 bool isRunning(pid_t process);
 /// True for a thread of this process that waits for something.
-bool isAsleep(pid_t thread);
+bool isBlocked(pid_t thread);
 
 }  // namespace brivo::test

@@ -303,7 +303,7 @@ TEST(ImagingServiceTest, ItEndsSoonWhileAWorkerHangsAndOthersWait) {
     waiting = ::gettid();
     EXPECT_FALSE(service.thumbnail(file, {}));
   });
-  ASSERT_TRUE(waitUntil([&] { return waiting != 0 && test::isAsleep(waiting); }));
+  ASSERT_TRUE(waitUntil([&] { return waiting != 0 && test::isBlocked(waiting); }));
   const auto start = Clock::now();
   owner.reset();
   EXPECT_LT(Clock::now() - start, seconds(5));

@@ -24,4 +24,15 @@ inline void expectBounded(const std::string& bytes) {
   }
 }
 
+/// The same for the file with any one of its bytes changed.
+inline void expectBoundedWithOtherBytes(const std::string& bytes) {
+  for (std::size_t place = 0; place < bytes.size(); ++place) {
+    for (const char other : {'\0', '\1', '\x7F', '\xFF'}) {
+      std::string changed = bytes;
+      changed[place] = other;
+      expectBounded(changed);
+    }
+  }
+}
+
 }  // namespace brivo::images

@@ -168,16 +168,7 @@ TEST(Cr3, EveryCutOfAFileGivesWhatIsLeft) {
   for (std::size_t length = 0; length < bytes.size(); ++length) expectBounded(bytes.substr(0, length));
 }
 
-TEST(Cr3, NoByteThatIsDifferentLeadsOutOfTheFile) {
-  const std::string bytes = built({});
-  for (std::size_t place = 0; place < bytes.size(); ++place) {
-    for (const char other : {'\0', '\1', '\x7F', '\xFF'}) {
-      std::string changed = bytes;
-      changed[place] = other;
-      expectBounded(changed);
-    }
-  }
-}
+TEST(Cr3, NoByteThatIsDifferentLeadsOutOfTheFile) { expectBoundedWithOtherBytes(built({})); }
 
 }  // namespace
 }  // namespace brivo::images

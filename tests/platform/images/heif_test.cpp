@@ -298,16 +298,7 @@ TEST(Heif, EveryCutOfAFileGivesWhatIsLeft) {
   for (std::size_t length = 0; length < bytes.size(); ++length) expectBounded(bytes.substr(0, length));
 }
 
-TEST(Heif, NoByteThatIsDifferentLeadsOutOfTheFile) {
-  const std::string bytes = typical().build();
-  for (std::size_t place = 0; place < bytes.size(); ++place) {
-    for (const char other : {'\0', '\1', '\x7F', '\xFF'}) {
-      std::string changed = bytes;
-      changed[place] = other;
-      expectBounded(changed);
-    }
-  }
-}
+TEST(Heif, NoByteThatIsDifferentLeadsOutOfTheFile) { expectBoundedWithOtherBytes(typical().build()); }
 
 }  // namespace
 }  // namespace brivo::images

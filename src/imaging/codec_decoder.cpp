@@ -32,8 +32,10 @@ constexpr std::array kKinds{
     Kind{0, "\xFF\x4F\xFF\x51"sv, AV_CODEC_ID_JPEG2000},
 };
 
-AVCodecID codecOf(std::span<const std::byte> file) {
-  const std::string_view text(reinterpret_cast<const char*>(file.data()), file.size());
+AVCodecID codecOf(const images::ByteSource& source) {
+  std::array<char, 16> start{};
+  const std::size_t count = source.read(std::as_writable_bytes(std::span(start)), 0);
+  const std::string_view text(start.data(), count);
   for (const Kind& kind : kKinds) {
     if (text.size() > kind.offset && text.substr(kind.offset).starts_with(kind.bytes)) return kind.codec;
   }
@@ -95,9 +97,10 @@ Frame chosenPage(std::vector<std::byte>& file, const ThumbnailRequest& request) 
 
 std::optional<Picture> decodeWithCodec(const images::ByteSource& source, const ThumbnailRequest& request) {
   if (request.source == ThumbnailSource::embedded) return std::nullopt;
-  std::vector<std::byte> file = wholeFile(source);
-  const AVCodecID id = codecOf(file);
+  const AVCodecID id = codecOf(source);
   if (id == AV_CODEC_ID_NONE) return std::nullopt;
+  std::vector<std::byte> file = wholeFile(source);
+  if (file.empty()) return std::nullopt;
   Picture picture;
   picture.frame = id == AV_CODEC_ID_TIFF ? chosenPage(file, request) : decodeFile(id, file);
   if (!picture.frame) return std::nullopt;

@@ -26,9 +26,6 @@ Dictionary withErrorCode(const Dictionary& options, std::int32_t code) {
 
 std::string nameOf(const std::shared_ptr<BrivoItem>& item) { return item ? item->name() : std::string(); }
 
-/// What a read gave, nothing when it failed.
-std::size_t usable(std::int64_t count) { return count > 0 ? static_cast<std::size_t>(count) : 0; }
-
 }  // namespace
 
 ObjectRequests::ObjectRequests(ObjectIndex& index, const DeviceNotifications& notifications,
@@ -114,7 +111,7 @@ Dictionary ObjectRequests::readIntoBuffer(BrivoFile* file, Range range, const Di
     if (memory.empty()) {
       range.code = kResultBadRange;
     } else if (file->openStream()) {
-      count = usable(file->readStream(memory, range.offset));
+      count = static_cast<std::uint64_t>(std::max<std::int64_t>(0, file->readStream(memory, range.offset)));
       file->closeStream();
     }
   }

@@ -28,13 +28,12 @@ void BrivoFile::thumbnailDataWithOptions(const Dictionary& options, const Result
   const auto width =
       static_cast<std::uint32_t>(options.unsignedInteger(keys::kThumbnailMaxPixelSize).value_or(0));
   updateBasicMetadata();
-  const auto metadata = metadataDict();
+  Dictionary metadata = metadataDict().value_or(Dictionary());
+  const Value* stated = imageOrientation() != 0 ? metadata.find("Orientation") : nullptr;
+  const auto orientation = stated ? std::optional(*stated) : std::nullopt;
   Dictionary result;
-  if (metadata && !metadata->empty()) result.set(keys::kMetadata, *metadata);
-  if (const Value* orientation = metadata ? metadata->find("Orientation") : nullptr;
-      orientation && imageOrientation() != 0) {
-    result.set("Orientation", *orientation);
-  }
+  if (!metadata.empty()) result.set(keys::kMetadata, std::move(metadata));
+  if (orientation) result.set("Orientation", *orientation);
   if (auto thumbnail = thumbnailDataForPixelWidth(width)) result.set(keys::kThumb, *std::move(thumbnail));
   reply(std::move(result));
 }

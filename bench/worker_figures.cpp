@@ -34,7 +34,8 @@ void takeThumbnail(ImageDecoder& decoder, const UniqueFd& file, unsigned pixels)
 }
 
 void compareDecoders(const UniqueFd& photo, const Options& options) {
-  ImagingService service(builtWorker());
+  WorkerPool workers(builtWorker());
+  ImagingService service(workers);
   LocalImageDecoder local;
   const auto timeOf = [&](ImageDecoder& decoder) {
     return millisecondsOf([&] { takeThumbnail(decoder, photo, kPixels); });
@@ -49,7 +50,8 @@ void printTimeOfStart(const UniqueFd& tiny, const Options& options) {
   std::vector<double> times;
   for (int i = 0; i < options.pick(31, 5); ++i) {
     times.push_back(millisecondsOf([&] {
-      ImagingService service(builtWorker());
+      WorkerPool workers(builtWorker());
+      ImagingService service(workers);
       takeThumbnail(service, tiny, kTiny);
     }));
   }

@@ -45,7 +45,8 @@ class Service {
   DesktopCatalogue applications_;
   TaskIdentity identity_{applications_};
   LogindInhibitors power_;
-  ImagingService images_;
+  WorkerPool workers_;
+  ImagingService images_{workers_};
   AccessDatabase database_;
   OVDeviceAccessManager access_{database_, applications_, nullptr};
   Transactions transactions_;

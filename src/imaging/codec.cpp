@@ -65,33 +65,62 @@ Packet packetOf(std::span<const std::byte> bytes) {
   return packet;
 }
 
-std::optional<Codec> Codec::open(AVCodecID id, std::span<const std::byte> configuration, Care care) {
+Codec::Context Codec::makeContext(const AVCodec* codec, Care care) {
   av_log_set_level(AV_LOG_QUIET);  // what it says of bad files is for people who debug it
-  const AVCodec* codec = id == AV_CODEC_ID_NONE ? nullptr : avcodec_find_decoder(id);
-  if (!codec) return std::nullopt;
-  Context context(avcodec_alloc_context3(codec));
-  if (!context || !setConfiguration(*context, configuration)) return std::nullopt;
+  Context context(codec ? avcodec_alloc_context3(codec) : nullptr);
+  if (!context) return nullptr;
   context->thread_count = 1;
   context->max_pixels = static_cast<std::int64_t>(kMostPixels);
+  if (care == Care::reduced) context->skip_loop_filter = AVDISCARD_ALL;
+  return context;
+}
+
+std::optional<Codec> Codec::open(AVCodecID id, std::span<const std::byte> configuration, Care care) {
+  const AVCodec* codec = id == AV_CODEC_ID_NONE ? nullptr : avcodec_find_decoder(id);
+  Context context = makeContext(codec, care);
+  if (!context || !setConfiguration(*context, configuration)) return std::nullopt;
   // The TIFF decoder takes harmless oddities for damage.
   context->err_recognition = AV_EF_CRCCHECK | (id == AV_CODEC_ID_TIFF ? 0 : AV_EF_EXPLODE);
-  if (care == Care::reduced) context->skip_loop_filter = AVDISCARD_ALL;
   if (avcodec_open2(context.get(), codec, nullptr) != 0) return std::nullopt;
-  return Codec(std::move(context));
+  return Codec(std::move(context), false);
+}
+
+std::optional<Codec> Codec::open(const AVCodecParameters& track, Care care, int halvings) {
+  const AVCodec* codec = avcodec_find_decoder(track.codec_id);
+  Context context = makeContext(codec, care);
+  if (!context || avcodec_parameters_to_context(context.get(), &track) < 0) return std::nullopt;
+  context->lowres = std::min<int>(halvings, codec->max_lowres);
+  if (avcodec_open2(context.get(), codec, nullptr) != 0) return std::nullopt;
+  return Codec(std::move(context), true);
+}
+
+bool Codec::isUsable(const AVFrame& frame) const {
+  const bool isDamaged = (frame.flags & AV_FRAME_FLAG_CORRUPT) != 0 || frame.decode_error_flags != 0;
+  if ((isDamaged && !concealsDamage_) || frame.width <= 0 || frame.height <= 0) return false;
+  return isWithinLimits(static_cast<std::uint64_t>(frame.width), static_cast<std::uint64_t>(frame.height));
 }
 
 Frame Codec::decode(const AVPacket& packet) {
   Frame frame(av_frame_alloc());
   if (!frame) return nullptr;
-  // The end of the stream behind each picture makes the codec hand it out, and a flush makes it go on.
-  const bool isDecoded = avcodec_send_packet(context_.get(), &packet) == 0 &&
-                         avcodec_send_packet(context_.get(), nullptr) == 0 &&
-                         avcodec_receive_frame(context_.get(), frame.get()) == 0;
+  // The end of the stream behind each picture makes the codec hand it out.
+  const bool isDecoded = send(&packet) && send(nullptr) && receive(*frame);
+  return finish(std::move(frame), isDecoded);
+}
+
+Frame Codec::decodeFirst(std::span<const Packet> packets) {
+  Frame frame(av_frame_alloc());
+  if (!frame) return nullptr;
+  const bool isEarly = std::any_of(packets.begin(), packets.end(), [&](const Packet& packet) {
+    return send(packet.get()) && receive(*frame);
+  });
+  const bool isDecoded = isEarly || (send(nullptr) && receive(*frame));
+  return finish(std::move(frame), isDecoded);
+}
+
+Frame Codec::finish(Frame frame, bool isDecoded) {
   avcodec_flush_buffers(context_.get());
-  const bool isDamaged = (frame->flags & AV_FRAME_FLAG_CORRUPT) != 0 || frame->decode_error_flags != 0;
-  if (!isDecoded || isDamaged || frame->width <= 0 || frame->height <= 0) return nullptr;
-  const auto width = static_cast<std::uint64_t>(frame->width);
-  if (!isWithinLimits(width, static_cast<std::uint64_t>(frame->height))) return nullptr;
+  if (!isDecoded || !isUsable(*frame)) return nullptr;
   unifyFormat(*frame);
   forgetUnknownColours(*frame);
   return frame;

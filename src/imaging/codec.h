@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-// Single pictures, decoded by libavcodec.
+// Pictures, decoded by libavcodec.
 #pragma once
 
 extern "C" {
@@ -32,7 +32,7 @@ enum class Care {
   reduced,  ///< without smoothing the borders of blocks: not seen in a picture that is scaled down to a third
 };
 
-/// Decodes pictures that share one configuration, each of them whole in itself. Makes no threads.
+/// Decodes pictures that share one configuration. Makes no threads.
 /// *Thread-bound.*
 class Codec {
  public:
@@ -41,8 +41,16 @@ class Codec {
   static std::optional<Codec> open(AVCodecID id, std::span<const std::byte> configuration = {},
                                    Care care = Care::exact);
 
-  /// The picture in `packet`, in its own size and depth; null when it is broken or beyond the limits.
+  /// Likewise, for the pictures of a movie, in which damage is concealed. They come in halves of their size,
+  /// `halvings` times over, as far as the codec can do that by itself.
+  static std::optional<Codec> open(const AVCodecParameters& track, Care care, int halvings);
+
+  /// The picture in `packet`, which needs no other, in its own depth, and in its own size but for halvings;
+  /// null when it is broken or beyond the limits.
   Frame decode(const AVPacket& packet);
+  /// The first picture that is shown of a movie whose packets begin with these, the first of them one that
+  /// needs no other; null when they hold none, as above.
+  Frame decodeFirst(std::span<const Packet> packets);
 
  private:
   struct FreeContext {
@@ -50,9 +58,18 @@ class Codec {
   };
   using Context = std::unique_ptr<AVCodecContext, FreeContext>;
 
-  explicit Codec(Context context) : context_(std::move(context)) {}
+  Codec(Context context, bool concealsDamage)
+      : context_(std::move(context)), concealsDamage_(concealsDamage) {}
+
+  static Context makeContext(const AVCodec* codec, Care care);
+  bool send(const AVPacket* packet) { return avcodec_send_packet(context_.get(), packet) == 0; }
+  bool receive(AVFrame& frame) { return avcodec_receive_frame(context_.get(), &frame) == 0; }
+  bool isUsable(const AVFrame& frame) const;
+  /// Makes ready for a picture that has nothing to do with those before.
+  Frame finish(Frame frame, bool isDecoded);
 
   Context context_;
+  bool concealsDamage_;
 };
 
 /// The ICC profile that came with a picture; empty when none did.

@@ -26,6 +26,12 @@ struct Job {
   UniqueFd result;
 };
 
+/// Who does what the service asks for.
+struct Readers {
+  ImageDecoder& decoder;
+  MovieReader& movies;
+};
+
 enum class Arrival { job, hangUp, fault };
 
 template <class Record>
@@ -118,7 +124,18 @@ WorkerReply image(const Job& job, ImageDecoder& decoder) {
   return reply;
 }
 
-WorkerReply perform(const Job& job, ImageDecoder& decoder) {
+WorkerReply movieDescription(const Job& job, MovieReader& movies) {
+  const auto movie = movies.describe(job.file);
+  return movie ? replyWith(job.result, encodeMovieDescription(*movie)) : WorkerReply{};
+}
+
+WorkerReply movieFrame(const Job& job, MovieReader& movies) {
+  const auto jpeg = movies.firstFrame(job.file, {job.request.maximumWidth, job.request.maximumHeight});
+  return jpeg ? replyWith(job.result, jpeg->bytes()) : WorkerReply{};
+}
+
+WorkerReply perform(const Job& job, const Readers& readers) {
+  auto& [decoder, movies] = readers;
   switch (job.request.operation) {
     case WorkerOperation::thumbnail:
       return thumbnail(job, decoder);
@@ -126,34 +143,38 @@ WorkerReply perform(const Job& job, ImageDecoder& decoder) {
       return imageWidths(job, decoder);
     case WorkerOperation::image:
       return image(job, decoder);
+    case WorkerOperation::movieDescription:
+      return movieDescription(job, movies);
+    case WorkerOperation::movieFrame:
+      return movieFrame(job, movies);
   }
   return {};
 }
 
-WorkerReply serve(const Job& job, ImageDecoder& decoder) {
+WorkerReply serve(const Job& job, const Readers& readers) {
   if (::ftruncate(job.result.get(), 1) != 0) return {};  // says that the request is taken
   try {
-    return perform(job, decoder);
+    return perform(job, readers);
   } catch (const std::exception&) {  // memory ran out, or a library's own way to say that it cannot
     return {};
   }
 }
 
 /// Receives a request and replies to it, when nothing of it is left here.
-Arrival serveNext(const UniqueFd& socket, ImageDecoder& decoder) {
+Arrival serveNext(const UniqueFd& socket, const Readers& readers) {
   WorkerReply reply;
   {
     Job job;
     const Arrival arrival = receive(socket, job);
     if (arrival != Arrival::job) return arrival;
-    reply = serve(job, decoder);
+    reply = serve(job, readers);
   }
   return send(socket, reply) ? Arrival::job : Arrival::hangUp;
 }
 
 }  // namespace
 
-int runWorker(UniqueFd socket, ImageDecoder& decoder) {
+int runWorker(UniqueFd socket, ImageDecoder& decoder, MovieReader& movies) {
   const auto protections = confine();
   if (!protections) {
     std::fprintf(stderr, "brivod-imaging: cannot %s\n", protections.error().text().c_str());
@@ -163,7 +184,7 @@ int runWorker(UniqueFd socket, ImageDecoder& decoder) {
   hello.landlockAbi = static_cast<std::uint32_t>(protections->landlockAbi);
   hello.memoryLimited = protections->memoryLimited ? 1 : 0;
   Arrival last = send(socket, hello) ? Arrival::job : Arrival::hangUp;
-  while (last == Arrival::job) last = serveNext(socket, decoder);
+  while (last == Arrival::job) last = serveNext(socket, {decoder, movies});
   return last == Arrival::fault ? 1 : 0;
 }
 

@@ -211,9 +211,27 @@ class ProbingDecoder final : public ImageDecoder {
   }
 };
 
+/// Movies whose only metadata is the answer.
+class ProbingMovieReader final : public MovieReader {
+ public:
+  std::optional<MovieDescription> describe(const UniqueFd& file) override {
+    const std::string text = contentOf(file);
+    if (text.empty()) return std::nullopt;
+    MovieDescription movie;
+    movie.metadata.push_back({"make", answerTo(text, file)});
+    return movie;
+  }
+
+  std::optional<Data> firstFrame(const UniqueFd& file, MaximumSize maximum) override {
+    if (contentOf(file).empty()) return std::nullopt;
+    return Data::copyOf(std::to_string(maximum.width) + " by " + std::to_string(maximum.height));
+  }
+};
+
 }  // namespace
 
 int main() {
   ProbingDecoder decoder;
-  std::_Exit(imaging::runWorker(UniqueFd(kWorkerSocket), decoder));
+  ProbingMovieReader movies;
+  std::_Exit(imaging::runWorker(UniqueFd(kWorkerSocket), decoder, movies));
 }

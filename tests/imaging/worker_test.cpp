@@ -48,7 +48,8 @@ class WorkerTest : public testing::Test {
     return options;
   }
 
-  ImagingService service_{options()};
+  WorkerPool workers_{options()};
+  ImagingService service_{workers_};
 };
 
 TEST_F(WorkerTest, NothingIsReachedBeyondWhatItWasHanded) {
@@ -108,7 +109,12 @@ TEST(WorkerProtocolTest, ARequestWithoutDescriptorsEndsTheWorker) {
       std::vector<std::uint32_t> imageWidths(const UniqueFd&) override { return {}; }
       std::optional<Image> image(const UniqueFd&, std::uint32_t) override { return std::nullopt; }
     } decoder;
-    return runWorker(UniqueFd(ends[1]), decoder);
+    class NoMovies final : public MovieReader {
+     public:
+      std::optional<MovieDescription> describe(const UniqueFd&) override { return std::nullopt; }
+      std::optional<Data> firstFrame(const UniqueFd&, MaximumSize) override { return std::nullopt; }
+    } movies;
+    return runWorker(UniqueFd(ends[1]), decoder, movies);
   };
   EXPECT_EQ(inChild(body), 1);
 }
@@ -139,7 +145,8 @@ TEST(ImagingProgramTest, SaysThatTheServiceStartsIt) {
     char text[1000];
     const std::size_t size = std::fread(text, 1, sizeof text, program);
     EXPECT_EQ(std::string_view(text, size),
-              "brivod-imaging decodes pictures for brivod, which starts it; it does nothing by itself.\n");
+              "brivod-imaging decodes pictures and movies for brivod, which starts it; it does nothing by "
+              "itself.\n");
     EXPECT_EQ(WEXITSTATUS(::pclose(program)), 2);
   }
 }
@@ -154,7 +161,8 @@ TEST(ImagingProgramTest, AFileThatIsNoPictureGivesNothingAndLeavesItAlive) {
     const MutexLock lock(mutex);
     lines.emplace_back(line);
   };
-  ImagingService service(options);
+  WorkerPool workers(options);
+  ImagingService service(workers);
   for (int i = 0; i < 3; ++i) EXPECT_FALSE(service.thumbnail(fileWith("no picture"), {}));
   EXPECT_TRUE(service.imageWidths(fileWith("no picture")).empty());
   EXPECT_FALSE(service.image(fileWith("no picture"), 0));

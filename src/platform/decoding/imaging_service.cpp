@@ -4,19 +4,12 @@
 #include <cstring>
 #include <utility>
 
-#include "platform/base/memory_file.h"
-
 namespace brivo {
 
 namespace {
 
 /// A file that claims more images is not believed.
 constexpr std::uint64_t kMostImages = 65'536;
-
-std::optional<Data> dataOf(std::optional<WorkerPool::Answer> answer) {
-  if (!answer || answer->reply.byteCount == 0) return std::nullopt;
-  return dataFromSealedMemfd(std::move(answer->result), answer->reply.byteCount);
-}
 
 bool isWhole(const WorkerReply& image) {
   const bool known = image.bytesPerPixel == 1 || image.bytesPerPixel == 4;
@@ -34,13 +27,13 @@ std::optional<Data> ImagingService::thumbnail(const UniqueFd& file, const Thumbn
   wanted.source = static_cast<std::uint32_t>(request.source);
   wanted.hasImageTallerThan = request.imageTallerThan ? 1 : 0;
   wanted.imageTallerThan = request.imageTallerThan.value_or(0);
-  return dataOf(workers_.ask(wanted, file));
+  return resultOf(workers_.ask(wanted, file));
 }
 
 std::vector<std::uint32_t> ImagingService::imageWidths(const UniqueFd& file) {
   WorkerRequest wanted;
   wanted.operation = WorkerOperation::imageWidths;
-  const auto data = dataOf(workers_.ask(wanted, file));
+  const auto data = resultOf(workers_.ask(wanted, file));
   if (!data || data->size() % sizeof(std::uint32_t) != 0) return {};
   std::vector<std::uint32_t> widths(data->size() / sizeof(std::uint32_t));
   if (widths.size() > kMostImages) return {};
@@ -55,7 +48,7 @@ std::optional<Image> ImagingService::image(const UniqueFd& file, std::uint32_t i
   auto answer = workers_.ask(wanted, file);
   if (!answer || !isWhole(answer->reply)) return std::nullopt;
   const WorkerReply reply = answer->reply;
-  auto pixels = dataOf(std::move(answer));
+  auto pixels = resultOf(std::move(answer));
   if (!pixels) return std::nullopt;
   return Image{reply.width, reply.height, reply.bytesPerPixel, std::move(*pixels)};
 }

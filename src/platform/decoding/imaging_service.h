@@ -11,14 +11,15 @@ namespace brivo {
 /// *Thread-safe.*
 class ImagingService final : public ImageDecoder {
  public:
-  explicit ImagingService(WorkerOptions options) : workers_(std::move(options)) {}
+  /// `workers` must outlive this.
+  explicit ImagingService(WorkerPool& workers) : workers_(workers) {}
 
   std::optional<Data> thumbnail(const UniqueFd& file, const ThumbnailRequest& request) override;
   std::vector<std::uint32_t> imageWidths(const UniqueFd& file) override;
   std::optional<Image> image(const UniqueFd& file, std::uint32_t index) override;
 
  private:
-  WorkerPool workers_;
+  WorkerPool& workers_;
 };
 
 }  // namespace brivo

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "platform/base/memfd.h"
+#include "platform/base/memory_file.h"
 
 namespace brivo {
 
@@ -185,6 +186,11 @@ void WorkerPool::complain(const std::string& trouble) {
     lastComplaint_ = now;
   }
   if (options_.log) options_.log("imaging worker: " + trouble);
+}
+
+std::optional<Data> resultOf(std::optional<WorkerPool::Answer> answer) {
+  if (!answer || answer->reply.byteCount == 0) return std::nullopt;
+  return dataFromSealedMemfd(std::move(answer->result), answer->reply.byteCount);
 }
 
 }  // namespace brivo

@@ -14,6 +14,7 @@
 #include <thread>
 #include <vector>
 
+#include "platform/base/data.h"
 #include "platform/base/mutex.h"
 #include "platform/base/unique_fd.h"
 #include "platform/decoding/child_keeper.h"
@@ -102,5 +103,8 @@ class WorkerPool {
 
   std::thread warmUp_;  // last: uses everything above
 };
+
+/// The bytes of an answer; none when there is none, or it is empty.
+std::optional<Data> resultOf(std::optional<WorkerPool::Answer> answer);
 
 }  // namespace brivo

@@ -20,9 +20,11 @@ inline constexpr std::uint64_t kMostResultBytes = std::uint64_t{512} << 20;
 
 /// What a worker is asked for, and what the bytes of its result are.
 enum class WorkerOperation : std::uint32_t {
-  thumbnail,    ///< a JPEG
-  imageWidths,  ///< a std::uint32_t for each image
-  image,        ///< rows of pixels
+  thumbnail,         ///< a JPEG
+  imageWidths,       ///< a std::uint32_t for each image
+  image,             ///< rows of pixels
+  movieDescription,  ///< as encodeMovieDescription() has it
+  movieFrame,        ///< a JPEG
 };
 
 enum class WorkerStatus : std::uint32_t {
@@ -44,6 +46,9 @@ struct WorkerRequest {
   std::uint32_t hasImageTallerThan = 0;  ///< 1: the next counts
   std::uint32_t imageTallerThan = 0;
   std::uint32_t imageIndex = 0;  ///< of WorkerOperation::image
+  // Of WorkerOperation::movieFrame, as in MaximumSize.
+  std::uint32_t maximumWidth = 0;
+  std::uint32_t maximumHeight = 0;
 };
 
 struct WorkerReply {

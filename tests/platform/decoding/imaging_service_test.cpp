@@ -89,7 +89,8 @@ class CommandPipe {
 };
 
 TEST(ImagingServiceTest, ARequestReachesTheDecoderAsItIs) {
-  ImagingService service(probingWorkers());
+  WorkerPool workers(probingWorkers());
+  ImagingService service(workers);
   const UniqueFd file = fileWith("request");
   const auto answer = [&](const ThumbnailRequest& request) {
     return std::string(service.thumbnail(file, request).value_or(Data()).text());
@@ -100,7 +101,8 @@ TEST(ImagingServiceTest, ARequestReachesTheDecoderAsItIs) {
 }
 
 TEST(ImagingServiceTest, WidthsAndPixelsComeBack) {
-  ImagingService service(probingWorkers());
+  WorkerPool workers(probingWorkers());
+  ImagingService service(workers);
   EXPECT_THAT(service.imageWidths(fileWith("two images")), ElementsAre(6000, 160));
   EXPECT_THAT(service.imageWidths(fileWith("none")), IsEmpty());
   const auto image = service.image(fileWith("any"), 1);
@@ -114,7 +116,8 @@ TEST(ImagingServiceTest, WidthsAndPixelsComeBack) {
 }
 
 TEST(ImagingServiceTest, AnAnswerIsAMemoryFileThatNobodyCanChange) {
-  ImagingService service(probingWorkers());
+  WorkerPool workers(probingWorkers());
+  ImagingService service(workers);
   const auto answer = service.thumbnail(fileWith("content"), {});
   ASSERT_TRUE(answer);
   ASSERT_GE(answer->memfd(), 0);
@@ -123,7 +126,8 @@ TEST(ImagingServiceTest, AnAnswerIsAMemoryFileThatNobodyCanChange) {
 }
 
 TEST(ImagingServiceTest, AFileThatIsOpenForWritingIsNotHandedOver) {
-  ImagingService service(probingWorkers());
+  WorkerPool workers(probingWorkers());
+  ImagingService service(workers);
   const test::TemporaryFolder folder;
   test::writeFile(folder / "file", "content");
   const UniqueFd writable(::open((folder / "file").c_str(), O_RDWR | O_CLOEXEC));
@@ -136,7 +140,8 @@ TEST(ImagingServiceTest, TheFirstWorkerIsThereBeforeItIsNeededAndSaysHowItIsConf
   Lines lines;
   WorkerOptions options = probingWorkers();
   options.log = lines.sink();
-  ImagingService service(options);
+  WorkerPool workers(options);
+  ImagingService service(workers);
   EXPECT_TRUE(waitUntil([&] { return !lines.all().empty(); }));
   EXPECT_EQ(childrenOf(::getpid()).size(), 1U);
   EXPECT_EQ(answerTo(service, "content"), "content");
@@ -148,7 +153,8 @@ class FaultTest : public testing::TestWithParam<const char*> {};
 TEST_P(FaultTest, CostsOneRequestAndNothingElse) {
   WorkerOptions options = probingWorkers(1);
   options.budget = milliseconds(300);
-  ImagingService service(options);
+  WorkerPool workers(options);
+  ImagingService service(workers);
   const std::string before = answerTo(service, "process");
   EXPECT_EQ(answerTo(service, GetParam()), "nothing");
   const std::string after = answerTo(service, "process");
@@ -162,14 +168,16 @@ INSTANTIATE_TEST_SUITE_P(ImagingServiceTest, FaultTest,
                                          "keep a mapping"));
 
 TEST(ImagingServiceTest, AnAnswerThatNobodyAskedForIsNotTakenForTheNext) {
-  ImagingService service(probingWorkers(1));
+  WorkerPool workers(probingWorkers(1));
+  ImagingService service(workers);
   EXPECT_EQ(answerTo(service, "reply twice"), "nothing");
   EXPECT_THAT(answerTo(service, "next"), testing::AnyOf("next", "nothing"));
   for (int i = 0; i < 3; ++i) EXPECT_EQ(answerTo(service, "next"), "next");
 }
 
 TEST(ImagingServiceTest, AHangingNeighbourHoldsUpNobody) {
-  ImagingService service(probingWorkers(2));
+  WorkerPool workers(probingWorkers(2));
+  ImagingService service(workers);
   const CommandPipe hanging("hang");
   std::thread neighbour([&] { EXPECT_FALSE(service.thumbnail(hanging.file(), {})); });
   EXPECT_TRUE(waitUntil([&] { return hanging.isTaken(); }));
@@ -182,7 +190,8 @@ TEST(ImagingServiceTest, AHangingNeighbourHoldsUpNobody) {
 }
 
 TEST(ImagingServiceTest, AWorkerThatWasKilledWhileIdleCostsNothing) {
-  ImagingService service(probingWorkers(2));
+  WorkerPool workers(probingWorkers(2));
+  ImagingService service(workers);
   for (int i = 0; i < 20; ++i) {
     const std::string process = answerTo(service, "process");
     ASSERT_EQ(::kill(std::stoi(process), SIGKILL), 0);
@@ -191,7 +200,8 @@ TEST(ImagingServiceTest, AWorkerThatWasKilledWhileIdleCostsNothing) {
 }
 
 TEST(ImagingServiceTest, CallersWaitForAFreeWorker) {
-  ImagingService service(probingWorkers(1));
+  WorkerPool workers(probingWorkers(1));
+  ImagingService service(workers);
   std::vector<std::thread> callers;
   std::atomic<int> answered = 0;
   for (int i = 0; i < 4; ++i) {
@@ -208,7 +218,8 @@ TEST(ImagingServiceTest, CallersWaitForAFreeWorker) {
 TEST(ImagingServiceTest, AWorkerIsReplacedAfterSoManyFiles) {
   WorkerOptions options = probingWorkers(1);
   options.filesPerWorker = 3;
-  ImagingService service(options);
+  WorkerPool workers(options);
+  ImagingService service(workers);
   std::vector<std::string> processes;
   for (int i = 0; i < 9; ++i) processes.push_back(answerTo(service, "process"));
   EXPECT_THAT(processes, testing::Not(testing::Contains("nothing")));
@@ -221,7 +232,8 @@ TEST(ImagingServiceTest, AWorkerIsReplacedAfterSoManyFiles) {
 TEST(ImagingServiceTest, RandomKillsCostTheirRequestsAtMost) {
   const std::size_t descriptors = openDescriptorCount();
   {
-    ImagingService service(probingWorkers(2));
+    WorkerPool workers(probingWorkers(2));
+    ImagingService service(workers);
     std::atomic<int> pictures = 0;
     std::atomic<int> answers = 0;
     std::atomic<bool> ending = false;
@@ -264,7 +276,8 @@ TEST(ImagingServiceTest, NeitherDescriptorsNorProcessesAreLeft) {
   for (int i = 0; i < 3; ++i) {
     WorkerOptions options = probingWorkers(2);
     options.filesPerWorker = 2;
-    ImagingService service(options);
+    WorkerPool workers(options);
+    ImagingService service(workers);
     for (const char* command : {"content", "crash", "content", "keep a mapping", "", "content"}) {
       (void)answerTo(service, command);
     }
@@ -279,7 +292,8 @@ void expectNoPictures(const std::string& program) {
   WorkerOptions options = probingWorkers();
   options.program = program;
   options.log = lines.sink();
-  ImagingService service(options);
+  WorkerPool workers(options);
+  ImagingService service(workers);
   const auto start = Clock::now();
   for (int i = 0; i < 10; ++i) EXPECT_EQ(answerTo(service, "content"), "nothing");
   EXPECT_LT(Clock::now() - start, seconds(5));
@@ -292,8 +306,8 @@ TEST(ImagingServiceTest, AMissingProgramYieldsNothingAtOnce) { expectNoPictures(
 TEST(ImagingServiceTest, AProgramThatIsNoWorkerYieldsNothingAtOnce) { expectNoPictures("/bin/false"); }
 
 TEST(ImagingServiceTest, ItEndsSoonWhileAWorkerHangsAndOthersWait) {
-  auto owner = std::make_unique<ImagingService>(probingWorkers(1));
-  ImagingService& service = *owner;
+  auto owner = std::make_unique<WorkerPool>(probingWorkers(1));
+  ImagingService service(*owner);
   const CommandPipe hanging("hang");
   std::thread caller([&] { EXPECT_FALSE(service.thumbnail(hanging.file(), {})); });
   ASSERT_TRUE(waitUntil([&] { return hanging.isTaken(); }));
@@ -317,7 +331,8 @@ TEST(ImagingServiceTest, AHangingWorkerDoesNotOutliveAServiceThatIsKilled) {
   const pid_t host = ::fork();
   if (host == 0) {
     ::prctl(PR_SET_PDEATHSIG, SIGKILL);
-    ImagingService service(probingWorkers(1));
+    WorkerPool workers(probingWorkers(1));
+    ImagingService service(workers);
     (void)service.thumbnail(hanging.file(), {});
     ::_exit(0);
   }

@@ -1,0 +1,32 @@
+// SPDX-License-Identifier: MIT
+// Movies that are really coded and muxed, for tests.
+#pragma once
+
+extern "C" {
+#include <libavcodec/avcodec.h>
+}
+
+#include <cstdint>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace brivo::test {
+
+struct MadeMovie {
+  const char* container = "mov";  ///< a muxer of libavformat
+  const char* encoder = "mjpeg";  ///< of libavcodec
+  AVPixelFormat format = AV_PIX_FMT_YUV420P;
+  std::uint32_t width = 64;
+  std::uint32_t height = 48;
+  int frames = 10;  ///< 25 of them a second
+  AVRational pixelShape = {1, 1};
+  std::vector<std::pair<std::string, std::string>> muxerOptions = {};
+  std::vector<std::pair<std::string, std::string>> metadata = {};
+};
+
+/// Its pictures are madeFrame(), each a little brighter than the one before. Throws when the library cannot
+/// make it.
+std::string madeMovie(const MadeMovie& movie);
+
+}  // namespace brivo::test

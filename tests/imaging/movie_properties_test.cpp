@@ -1,0 +1,338 @@
+// SPDX-License-Identifier: MIT
+// What movies say of themselves, in made-up files and in those of real muxers.
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include "imaging/descriptor_source.h"
+#include "imaging/made_movies.h"
+#include "imaging/made_pictures.h"
+#include "imaging/movie_bytes.h"
+#include "imaging/movie_request.h"
+#include "iso_bytes.h"
+#include "platform/movies/movie_description.h"
+#include "reading.h"
+#include "support/temporary_folder.h"
+
+namespace brivo::imaging {
+namespace {
+
+using images::CountingSource;
+using images::MemorySource;
+using test::cleanApertureBox;
+using test::MadeMovie;
+using test::matrixOf;
+using test::MovieBytes;
+using test::pixelShapeBox;
+using test::TrackBytes;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr std::uint64_t kMostBesidesIndex = 2'097'152;
+
+std::optional<MovieDescription> describe(const std::string& file) {
+  return describeMovie(MemorySource(std::as_bytes(std::span(file))));
+}
+
+/// Of a file with one track.
+VideoTrack trackOf(const TrackBytes& track) {
+  const auto movie = describe(MovieBytes{.tracks = {track}}.build());
+  EXPECT_TRUE(movie && movie->videoTracks.size() == 1);
+  return movie && !movie->videoTracks.empty() ? movie->videoTracks.front() : VideoTrack();
+}
+
+VideoDimensions shown(const TrackBytes& track) {
+  return presentationDimensions(trackOf(track).formatDescriptions.at(0));
+}
+
+TEST(MoviePropertiesTest, TheTransformIsTheMatrixOfTheTrack) {
+  struct Turn {
+    test::TrackMatrix matrix;
+    AffineTransform transform;
+  };
+  for (const auto& [matrix, transform] : {Turn{matrixOf(1, 0, 0, 1), AffineTransform::identity()},
+                                          Turn{matrixOf(0, 1, -1, 0, 48, 0), {0, 1, -1, 0, 48, 0}},
+                                          Turn{matrixOf(-1, 0, 0, -1, 64, 48), {-1, 0, 0, -1, 64, 48}},
+                                          Turn{matrixOf(0, -1, 1, 0, 0, 64), {0, -1, 1, 0, 0, 64}},
+                                          Turn{matrixOf(-1, 0, 0, 1, 64, 0), {-1, 0, 0, 1, 64, 0}},
+                                          Turn{matrixOf(0, 1, 1, 0), {0, 1, 1, 0, 0, 0}}}) {
+    EXPECT_EQ(trackOf({.matrix = matrix}).preferredTransform, transform) << transform.a << transform.b;
+  }
+}
+
+TEST(MoviePropertiesTest, FractionsOfTheMatrixAreThereToo) {
+  test::TrackMatrix matrix = matrixOf(0, 0, 0, 0);
+  matrix[0] = test::kOne16 / 2;
+  matrix[1] = -test::kOne16 / 4;
+  EXPECT_EQ(trackOf({.matrix = matrix}).preferredTransform, (AffineTransform{0.5, -0.25, 0, 0, 0, 0}));
+}
+
+TEST(MoviePropertiesTest, TheCleanApertureIsWhatIsShown) {
+  EXPECT_EQ(shown({.entryBoxes = cleanApertureBox(60, 40, 0, 0)}), (VideoDimensions{60, 40}));
+}
+
+TEST(MoviePropertiesTest, PixelsThatAreNotSquareChangeTheWidth) {
+  EXPECT_EQ(shown({.entryBoxes = pixelShapeBox(4, 3)}), (VideoDimensions{64 * 4.0 / 3, 48}));
+}
+
+TEST(MoviePropertiesTest, BothAreApplied) {
+  const TrackBytes track{.entryBoxes = pixelShapeBox(2, 1) + cleanApertureBox(60, 40, 1, -1)};
+  EXPECT_EQ(shown(track), (VideoDimensions{120, 40}));
+}
+
+TEST(MoviePropertiesTest, ACleanApertureBeyondThePictureDoesNotCount) {
+  for (const auto& box : {cleanApertureBox(65, 48, 0, 0), cleanApertureBox(60, 48, 3, 0),
+                          cleanApertureBox(-60, 48, 0, 0), cleanApertureBox(60, 40, 0, 1'000'000)}) {
+    EXPECT_EQ(shown({.entryBoxes = box}), (VideoDimensions{64, 48}));
+  }
+}
+
+TEST(MoviePropertiesTest, PixelsWithoutASideCountAsSquare) {
+  EXPECT_EQ(shown({.entryBoxes = pixelShapeBox(0, 3)}), (VideoDimensions{64, 48}));
+  EXPECT_EQ(shown({.entryBoxes = pixelShapeBox(3, 0)}), (VideoDimensions{64, 48}));
+}
+
+TEST(MoviePropertiesTest, TheTracksAreInOrderAndSoundIsNone) {
+  const MovieBytes movie{.tracks = {{.handler = "soun", .format = "sowt"},
+                                    {.width = 32, .height = 16},
+                                    {.width = 128, .height = 96}}};
+  const auto found = describe(movie.build());
+  ASSERT_TRUE(found);
+  ASSERT_EQ(found->videoTracks.size(), 2u);
+  EXPECT_EQ(found->videoTracks[0].formatDescriptions.at(0).width, 32u);
+  EXPECT_EQ(found->videoTracks[1].formatDescriptions.at(0).width, 128u);
+}
+
+TEST(MoviePropertiesTest, EachTrackHasItsOwnCleanAperture) {
+  const MovieBytes movie{.tracks = {{.entryBoxes = cleanApertureBox(60, 40, 0, 0)},
+                                    {.entryBoxes = cleanApertureBox(20, 10, 0, 0)}}};
+  const auto found = describe(movie.build());
+  ASSERT_TRUE(found);
+  ASSERT_EQ(found->videoTracks.size(), 2u);
+  EXPECT_EQ(found->videoTracks[1].formatDescriptions.at(0).cleanAperture->width, 20);
+}
+
+TEST(MoviePropertiesTest, AMovieWithSoundAloneHasNoVideoTrack) {
+  const MovieBytes movie{.tracks = {{.handler = "soun", .format = "sowt"}}};
+  const auto found = describe(movie.build());
+  ASSERT_TRUE(found);
+  EXPECT_THAT(found->videoTracks, IsEmpty());
+  EXPECT_EQ(found->duration, 2);
+}
+
+TEST(MoviePropertiesTest, ACoverIsNoVideoTrack) {
+  const std::string jpeg = test::madeJpeg(32, 32);
+  using test::big;
+  using test::box;
+  using test::fullBox;
+  const std::string cover = box("covr", box("data", big(13, 4) + big(0, 4) + jpeg));
+  const std::string handler = fullBox("hdlr", 0, 0, std::string(4, '\0') + "mdir" + std::string(13, '\0'));
+  const MovieBytes movie{.brand = "M4A ",
+                         .tracks = {{.handler = "soun", .format = "sowt"}},
+                         .userData = fullBox("meta", 0, 0, handler + box("ilst", cover))};
+  const auto found = describe(movie.build());
+  ASSERT_TRUE(found);
+  EXPECT_THAT(found->videoTracks, IsEmpty());
+}
+
+TEST(MoviePropertiesTest, CommonItemsComeFromAnyKeyThatEndsInTheirName) {
+  const MovieBytes movie{.tracks = {TrackBytes{}},
+                         .metaBox = test::keysBox({{"org.example.make", "A Maker"},
+                                                   {"org.example.Model", "A Model"},
+                                                   {"software", "7.1"},
+                                                   {"org.example.content.identifier", "THE-ID"},
+                                                   {"org.example.modelnumber", "no"},
+                                                   {"identifier", "no"}})};
+  const auto found = describe(movie.build());
+  ASSERT_TRUE(found);
+  EXPECT_THAT(found->metadata,
+              ElementsAre(MovieMetadataItem{"make", "A Maker"}, MovieMetadataItem{"model", "A Model"},
+                          MovieMetadataItem{"software", "7.1"}, MovieMetadataItem{"identifier", "THE-ID"}));
+}
+
+TEST(MoviePropertiesTest, UserDataOfQuickTimeNamesMakeAndModel) {
+  const MovieBytes movie{.tracks = {TrackBytes{}},
+                         .userData = test::userText("mak", "A Maker") + test::userText("mod", "A Model")};
+  const auto found = describe(movie.build());
+  ASSERT_TRUE(found);
+  EXPECT_THAT(found->metadata,
+              ElementsAre(MovieMetadataItem{"make", "A Maker"}, MovieMetadataItem{"model", "A Model"}));
+}
+
+TEST(MoviePropertiesTest, AMovieOfNoTimeHasADurationOfNothing) {
+  const auto found = describe(MovieBytes{.duration = 0, .tracks = {TrackBytes{}}}.build());
+  ASSERT_TRUE(found);
+  EXPECT_EQ(found->duration, 0);
+  EXPECT_EQ(found->videoTracks.size(), 1u);
+}
+
+TEST(MoviePropertiesTest, EncryptedTracksAreNotDecodable) {
+  using test::big;
+  using test::box;
+  const std::string protection =
+      box("sinf", box("frma", "avc1") + test::fullBox("schm", 0, 0, "cenc" + big(0x10000, 4)));
+  const VideoTrack track = trackOf({.format = "encv", .entryBoxes = protection});
+  EXPECT_FALSE(track.decodable);
+  EXPECT_EQ(track.formatDescriptions.size(), 1u);
+}
+
+TEST(MoviePropertiesTest, UnknownCodecsAreNotDecodable) {
+  EXPECT_FALSE(trackOf({.format = "zzzz"}).decodable);
+  EXPECT_TRUE(trackOf({.format = "jpeg"}).decodable);
+}
+
+TEST(MoviePropertiesTest, PicturesOfNoSizeAreNoFormat) {
+  EXPECT_THAT(trackOf({.width = 0, .height = 0}).formatDescriptions, IsEmpty());
+}
+
+TEST(MoviePropertiesTest, WhatIsNoMovieIsNone) {
+  EXPECT_FALSE(describe(""));
+  EXPECT_FALSE(describe("no movie at all"));
+  EXPECT_FALSE(describe(test::madeJpeg(64, 48)));
+  EXPECT_FALSE(describe("#EXTM3U\n#EXT-X-TARGETDURATION:1\n#EXTINF:1,\n/etc/passwd\n"));
+  EXPECT_FALSE(describe("ffconcat version 1.0\nfile /etc/passwd\n"));
+}
+
+TEST(MoviePropertiesTest, AMovieThatIsCutShortIsBoundedWhereverItIs) {
+  const std::string file =
+      MovieBytes{.tracks = {{.entryBoxes = pixelShapeBox(4, 3), .samples = {test::madeJpeg(64, 48)}}},
+                 .metaBox = test::keysBox({{"a.make", "x"}}),
+                 .isIndexLast = false}
+          .build();
+  for (std::size_t length = 0; length < file.size(); ++length) {
+    const CountingSource source(file.substr(0, length));
+    (void)describeMovie(source);
+    ASSERT_LE(source.bytesRead(), length * 40 + kMostBesidesIndex) << length;
+  }
+}
+
+TEST(MoviePropertiesTest, AMovieWithAnyOtherByteIsBounded) {
+  const std::string file =
+      MovieBytes{.tracks = {{.entryBoxes = cleanApertureBox(60, 40, 0, 0)}}, .isIndexLast = false}.build();
+  for (std::size_t place = 0; place < file.size(); ++place) {
+    for (const char other : {'\0', '\1', '\x7F', '\xFF'}) {
+      std::string changed = file;
+      changed[place] = other;
+      const CountingSource source(changed);
+      (void)describeMovie(source);
+      ASSERT_LE(source.bytesRead(), kMostBesidesIndex) << place;
+    }
+  }
+}
+
+TEST(MoviePropertiesTest, OfAMovieOf100GiBTheIndexAtItsEndIsRead) {
+  const test::TemporaryFolder folder;
+  const MovieBytes movie{
+      .tracks = {{.entryBoxes = cleanApertureBox(60, 40, 0, 0), .samples = {test::madeJpeg(64, 48)}}},
+      .metaBox = test::keysBox({{"a.make", "A Maker"}})};
+  constexpr std::uint64_t padding = std::uint64_t{100} << 30;
+  const std::string beginning = movie.beginning(padding);
+  const std::string index = movie.ending();
+  test::writeFile(folder / "MVI_0001.MOV", beginning);
+  const UniqueFd file(::open((folder / "MVI_0001.MOV").c_str(), O_RDWR | O_CLOEXEC));
+  ASSERT_EQ(::pwrite(file.get(), index.data(), index.size(), static_cast<off_t>(beginning.size() + padding)),
+            static_cast<ssize_t>(index.size()));
+  class Counting final : public images::ByteSource {
+   public:
+    explicit Counting(const UniqueFd& fd) : source_(fd) {}
+    std::uint64_t size() const override { return source_.size(); }
+    std::size_t read(std::span<std::byte> buffer, std::uint64_t offset) const override {
+      const std::size_t count = source_.read(buffer, offset);
+      bytesRead += count;
+      return count;
+    }
+    mutable std::uint64_t bytesRead = 0;
+
+   private:
+    DescriptorSource source_;
+  };
+  const Counting source(file);
+  const auto found = describeMovie(source);
+  ASSERT_TRUE(found);
+  EXPECT_EQ(found->videoTracks.at(0).formatDescriptions.at(0).cleanAperture->width, 60);
+  EXPECT_THAT(found->metadata, ElementsAre(MovieMetadataItem{"make", "A Maker"}));
+  EXPECT_LT(source.bytesRead, kMostBesidesIndex + index.size());
+  EXPECT_TRUE(firstFrameOf(source, {32, 0}));
+  EXPECT_LT(source.bytesRead, 2 * (kMostBesidesIndex + index.size()));
+}
+
+class ContainerTest : public testing::TestWithParam<MadeMovie> {};
+
+INSTANTIATE_TEST_SUITE_P(
+    MoviePropertiesTest, ContainerTest,
+    testing::Values(
+        MadeMovie{.container = "mov", .encoder = "libx264"},
+        MadeMovie{.container = "mp4", .encoder = "libx265"},
+        MadeMovie{.container = "ipod", .encoder = "libx264"},
+        MadeMovie{.container = "mov", .encoder = "prores_ks", .format = AV_PIX_FMT_YUV422P10},
+        MadeMovie{.container = "mov", .encoder = "mjpeg", .format = AV_PIX_FMT_YUVJ420P},
+        MadeMovie{.container = "mp4",
+                  .encoder = "libx264",
+                  .muxerOptions = {{"movflags", "frag_keyframe+empty_moov"}}},
+        MadeMovie{.container = "3gp", .encoder = "h263", .width = 176, .height = 144},
+        MadeMovie{.container = "avi", .encoder = "mpeg4"},
+        MadeMovie{.container = "avi", .encoder = "mjpeg", .format = AV_PIX_FMT_YUVJ420P},
+        MadeMovie{.container = "mpegts", .encoder = "mpeg2video"},
+        MadeMovie{.container = "mpegts", .encoder = "libx264", .muxerOptions = {{"mpegts_m2ts_mode", "1"}}},
+        MadeMovie{.container = "vob", .encoder = "mpeg2video", .frames = 100},
+        MadeMovie{.container = "mpeg", .encoder = "mpeg1video", .frames = 100},
+        MadeMovie{.container = "matroska", .encoder = "libx264"},
+        MadeMovie{.container = "webm", .encoder = "libvpx"},
+        MadeMovie{.container = "webm", .encoder = "libvpx-vp9"},
+        MadeMovie{.container = "mp4", .encoder = "libaom-av1"},
+        MadeMovie{.container = "mxf", .encoder = "mpeg2video"}),
+    [](const auto& made) {
+      std::string name = std::string(made.param.container) + "_" + made.param.encoder;
+      if (!made.param.muxerOptions.empty()) name += "_" + made.param.muxerOptions[0].first;
+      std::ranges::replace(name, '-', '_');
+      return name;
+    });
+
+TEST_P(ContainerTest, SaysItsDurationAndTheSizeOfItsPictures) {
+  const MadeMovie& made = GetParam();
+  const CountingSource source(test::madeMovie(made));
+  const auto movie = describeMovie(source);
+  ASSERT_TRUE(movie);
+  // Some containers tell times only for whole groups of pictures.
+  EXPECT_NEAR(movie->duration.value_or(-1), made.frames / 25.0, made.frames > 10 ? 0.5 : 0.05);
+  ASSERT_EQ(movie->videoTracks.size(), 1u);
+  const VideoTrack& track = movie->videoTracks.front();
+  EXPECT_TRUE(track.decodable);
+  EXPECT_EQ(track.preferredTransform, AffineTransform::identity());
+  ASSERT_EQ(track.formatDescriptions.size(), 1u);
+  EXPECT_EQ(track.formatDescriptions[0].width, made.width);
+  EXPECT_EQ(track.formatDescriptions[0].height, made.height);
+  EXPECT_LT(source.bytesRead(), kMostBesidesIndex);
+}
+
+TEST_P(ContainerTest, ShowsItsFirstFrame) {
+  const MadeMovie& made = GetParam();
+  const std::string file = test::madeMovie(made);
+  const auto picture = firstFrameOf(MemorySource(std::as_bytes(std::span(file))), {});
+  ASSERT_TRUE(picture);
+  const Frame expected = test::madeFrame(made.width, made.height);
+  ASSERT_EQ(picture->frame->width, expected->width);
+  ASSERT_EQ(picture->frame->height, expected->height);
+  EXPECT_LT(test::meanDifference(*picture->frame, *expected), 5);
+}
+
+class OtherShapeTest : public testing::TestWithParam<MadeMovie> {};
+
+INSTANTIATE_TEST_SUITE_P(
+    MoviePropertiesTest, OtherShapeTest,
+    testing::Values(MadeMovie{.container = "mov", .encoder = "libx264", .pixelShape = {4, 3}},
+                    MadeMovie{.container = "matroska", .encoder = "libx264", .pixelShape = {4, 3}},
+                    MadeMovie{.container = "avi", .encoder = "mpeg4", .pixelShape = {4, 3}}),
+    [](const auto& made) { return std::string(made.param.container); });
+
+TEST_P(OtherShapeTest, TheShapeOfPixelsIsTakenFromWhereverItIsStated) {
+  const auto movie = describe(test::madeMovie(GetParam()));
+  ASSERT_TRUE(movie && movie->videoTracks.size() == 1);
+  const auto dimensions = presentationDimensions(movie->videoTracks[0].formatDescriptions.at(0));
+  EXPECT_NEAR(dimensions.width, 64 * 4.0 / 3, 0.5);
+  EXPECT_EQ(dimensions.height, 48);
+}
+
+}  // namespace
+}  // namespace brivo::imaging

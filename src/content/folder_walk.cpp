@@ -2,6 +2,7 @@
 #include "content/folder_walk.h"
 
 #include <algorithm>
+#include <chrono>
 
 #include "content/dcf_names.h"
 #include "content/grouping.h"
@@ -18,6 +19,8 @@ namespace {
 
 /// Enough to make the hand-over between steps cheap, few enough to let others in.
 constexpr int kGroupsPerStep = 64;
+/// A step ends after the group that takes it beyond this: movies can take long.
+constexpr std::chrono::milliseconds kStepTime{20};
 constexpr std::int64_t kOldestFirst = -1;
 
 constexpr std::size_t kLongestDumpedName = 18;
@@ -69,9 +72,11 @@ void FolderWalk::begin(CameraDevice& device) {
 }
 
 void FolderWalk::enumerateSomeGroups(CameraDevice& device) {
+  const auto end = std::chrono::steady_clock::now() + kStepTime;
   for (int i = 0; i < kGroupsPerStep && nextGroup_ < groups_.size(); ++i) {
     Group group = std::move(groups_[nextGroup_++]);
     enumerate(group);
+    if (std::chrono::steady_clock::now() >= end) break;
   }
   if (nextGroup_ < groups_.size()) {
     continueLater(device);

@@ -59,6 +59,7 @@ DeviceServices InProcessCatalogue::services() {
   return {pool_,
           systemFiles(),
           images_,
+          movies_,
           power_,
           nullptr,
           [this] { return std::move(connections_.anonymousListener(*folder_)).value(); },

@@ -7,6 +7,7 @@
 #include "catalogue_recorder.h"
 #include "device/brivo_device.h"
 #include "imaging/local_image_decoder.h"
+#include "imaging/local_movie_reader.h"
 #include "platform/zeph/connection_service.h"
 
 namespace brivo::bench {
@@ -35,6 +36,8 @@ class InProcessCatalogue {
   std::unique_ptr<zeph::RuntimeFolder> folder_;
   NoPower power_;
   LocalImageDecoder images_;
+  LocalMovieReader movieReader_;
+  MovieService movies_{movieReader_, 1, 1};
 };
 
 }  // namespace brivo::bench

@@ -16,6 +16,7 @@ namespace brivo {
 class BrivoItem;
 class ImageDecoder;
 class MetadataArchive;
+class MovieService;
 class ReadMemory;
 
 /// Owned by the device's side; items know it by this alone, and do not own it. *Thread-safe.*
@@ -45,6 +46,7 @@ class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
   /// What bytes of the device's files are read into for clients.
   virtual ReadMemory& readMemory() = 0;
   virtual ImageDecoder& imageDecoder() const = 0;
+  virtual MovieService& movies() const = 0;
 
   /// A queue of its own for work on one of the device's files.
   virtual std::shared_ptr<SerialQueue> makeSerialQueue() = 0;

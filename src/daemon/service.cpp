@@ -21,6 +21,9 @@ std::string dataFolder(const Settings& settings) {
   return appendingPathComponent(settings.dataHome, kDataFolder);
 }
 
+/// A card full of movies leaves a worker to those who want to see something.
+std::size_t movieLoads() { return WorkerOptions::defaultWorkerCount() - 1; }
+
 }  // namespace
 
 Service::Service(RunLoop& mainLoop, Settings settings, std::unique_ptr<zeph::RuntimeFolder> folder)
@@ -31,6 +34,7 @@ Service::Service(RunLoop& mainLoop, Settings settings, std::unique_ptr<zeph::Run
       power_(mainLoop_, [](const std::string& line) { OVLogError("power", "{}", line); }),
       workers_({.program = installedWorkerProgram(),
                 .log = [](std::string_view line) { OVLog("imaging", "{}", line); }}),
+      movies_(movieReader_, movieLoads(), WorkerOptions::defaultWorkerCount()),
       database_(pool_, dataFolder(settings_)),
       connections_(pool_, [](const std::string& line) { OVLogError("zeph", "{}", line); }),
       volumes_(pool_, settings_.volumeRoots, settings_.volumeFolders),
@@ -76,6 +80,7 @@ DeviceServices Service::deviceServices() {
   return {pool_,
           systemFiles(),
           images_,
+          movies_,
           power_,
           &access_,
           [this]() -> std::shared_ptr<zeph::Listener> {

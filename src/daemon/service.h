@@ -12,6 +12,8 @@
 #include "platform/decoding/imaging_service.h"
 #include "platform/identity/task_identity.h"
 #include "platform/keepalive/idle_exit.h"
+#include "platform/movies/movie_service.h"
+#include "platform/movies/worker_movie_reader.h"
 #include "platform/power/logind_inhibitors.h"
 #include "platform/settings/settings.h"
 #include "platform/volumes/volume_monitor.h"
@@ -47,6 +49,8 @@ class Service {
   LogindInhibitors power_;
   WorkerPool workers_;
   ImagingService images_{workers_};
+  WorkerMovieReader movieReader_{workers_};
+  MovieService movies_;
   AccessDatabase database_;
   OVDeviceAccessManager access_{database_, applications_, nullptr};
   Transactions transactions_;

@@ -112,6 +112,7 @@ class BrivoDevice final : public CameraDevice,
   MetadataArchive& metadataArchive() override { return metadataArchive_; }
   ReadMemory& readMemory() override { return readMemory_; }
   ImageDecoder& imageDecoder() const override { return services_.images; }
+  MovieService& movies() const override { return services_.movies; }
   std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(services_.pool); }
   void addInitiatedOperation(Task operation) override;
   void enumerateConcurrently(Task step) override;

@@ -10,6 +10,7 @@
 #include "platform/decoding/image_decoder.h"
 #include "platform/files/file_system.h"
 #include "platform/identity/audit_token.h"
+#include "platform/movies/movie_service.h"
 #include "platform/power/power_assertions.h"
 #include "platform/volumes/volume_statistics.h"
 #include "platform/work/pool.h"
@@ -22,6 +23,7 @@ struct DeviceServices {
   Pool& pool;
   FileSystem& files;
   ImageDecoder& images;
+  MovieService& movies;
   PowerAssertions& power;
   /// Null when nobody can decide; then every client is refused.
   OVDeviceAccessManager* access;

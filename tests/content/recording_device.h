@@ -11,7 +11,9 @@
 #include "content/camera_device.h"
 #include "content/media/brivo_file.h"
 #include "imaging/local_image_decoder.h"
+#include "imaging/local_movie_reader.h"
 #include "io/read_memory.h"
+#include "platform/movies/movie_service.h"
 #include "platform/work/pool.h"
 #include "ptp/object_info_dataset.h"
 
@@ -45,6 +47,7 @@ class RecordingDevice : public CameraDevice {
   MetadataArchive& metadataArchive() override { return archive; }
   ReadMemory& readMemory() override { return memory; }
   ImageDecoder& imageDecoder() const override { return decoder; }
+  MovieService& movies() const override { return movieService; }
   std::shared_ptr<SerialQueue> makeSerialQueue() override { return SerialQueue::create(pool); }
   void addInitiatedOperation(Task operation) override { operations.push_back(std::move(operation)); }
   /// Steps run in order on the test's thread, in run().
@@ -87,6 +90,8 @@ class RecordingDevice : public CameraDevice {
   MetadataArchive archive;
   ReadMemory memory{4'194'304};
   mutable LocalImageDecoder decoder;
+  LocalMovieReader movieReader;
+  mutable MovieService movieService{movieReader, 1, 1};
 };
 
 }  // namespace brivo

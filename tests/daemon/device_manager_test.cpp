@@ -10,6 +10,7 @@
 #include "access/access_database.h"
 #include "device/fake_connection.h"
 #include "imaging/local_image_decoder.h"
+#include "imaging/local_movie_reader.h"
 #include "platform/zeph/connection_service.h"
 #include "protocol/keys.h"
 #include "protocol/selectors.h"
@@ -58,6 +59,7 @@ class DeviceManagerTest : public testing::Test {
     return {pool,
             systemFiles(),
             images,
+            movies,
             power,
             nullptr,
             [this]() -> std::shared_ptr<zeph::Listener> {
@@ -100,6 +102,8 @@ class DeviceManagerTest : public testing::Test {
   std::unique_ptr<zeph::RuntimeFolder> folder = std::move(zeph::RuntimeFolder::claim(runtime.path())).value();
   NoPower power;
   LocalImageDecoder images;
+  LocalMovieReader movieReader;
+  MovieService movies{movieReader, 1, 1};
   bool noListeners = false;
   SaidDomains domains;
   Transactions transactions;

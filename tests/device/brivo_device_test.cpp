@@ -11,6 +11,7 @@
 
 #include "access/access_database.h"
 #include "imaging/local_image_decoder.h"
+#include "imaging/local_movie_reader.h"
 #include "platform/zeph/connection_service.h"
 #include "protocol/keys.h"
 #include "protocol/protocols.h"
@@ -97,6 +98,7 @@ class BrivoDeviceTest : public testing::Test {
     return {pool,
             systemFiles(),
             images,
+            movies,
             power,
             access,
             [this]() -> std::shared_ptr<zeph::Listener> {
@@ -144,6 +146,8 @@ class BrivoDeviceTest : public testing::Test {
   std::unique_ptr<zeph::RuntimeFolder> folder = std::move(zeph::RuntimeFolder::claim(runtime.path())).value();
   CountingPower power;
   LocalImageDecoder images;
+  LocalMovieReader movieReader;
+  MovieService movies{movieReader, 1, 1};
   NoApplications applications;
   AccessDatabase database{pool, home / "data"};
   OVDeviceAccessManager manager{database, applications, nullptr};

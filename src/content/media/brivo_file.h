@@ -17,6 +17,8 @@
 
 namespace brivo {
 
+class MovieAsset;
+
 /// A four-character code as a number, first character highest.
 constexpr std::uint32_t fourCharacterCode(const char (&code)[5]) {
   std::uint32_t value = 0;
@@ -139,6 +141,8 @@ class BrivoFile final : public BrivoItem, public ReadAheadSource {
   /// its size.
   std::optional<Data> thumbnailDataForPixelWidth(std::uint32_t width);
   std::optional<Data> imageThumbnailDataForPixelWidth(std::uint32_t width);
+  /// A JPEG of a movie's first frame, at most `width` pixels wide; 0: in its size.
+  std::optional<Data> movieThumbnailDataForPixelWidth(std::uint32_t width) const;
   /// The bytes of an embedded JPEG, unchanged; none when they are not in the file or do not begin as one.
   std::optional<Data> createThumbnailUsingOffsets(const SubImage& image);
   /// A JPEG of the decoded image.
@@ -186,6 +190,10 @@ class BrivoFile final : public BrivoItem, public ReadAheadSource {
   static void readFirstMetadata(const std::shared_ptr<BrivoFile>& file);
   void readCheapProperties(std::string_view extension);
   void readMovieProperties();
+  void buildMovieMetadata();
+  void fillMovieMetadata(MovieAsset& asset, Dictionary& result) const;
+  void fillMovieSize(MovieAsset& asset, Dictionary& result) const;
+  std::shared_ptr<MovieAsset> openMovie() const;
   void buildImageMetadata();
   bool keepMetadata(const images::ImageProperties& properties);
   std::optional<std::uint32_t> orientationFrom(const images::ImageProperties& properties);

@@ -79,13 +79,6 @@ void BrivoFile::readCheapProperties(std::string_view extension) {
   OVLog(name(), "{}", benchmarkLine("CopyMetadataFromSequentialDataProviderCallbacks", stopBenchmark()));
 }
 
-void BrivoFile::readMovieProperties() {
-  Dictionary properties = metadataDict().value_or(Dictionary());
-  setSizeAndOrientationFromImageProperties(properties);
-  metadata_ = std::move(properties);
-  setHasThumbnail(true);
-}
-
 void BrivoFile::metadataWithOptions(const Dictionary&, const ResultHandler& reply) {
   updateBasicMetadata();
   reply(metadataDict().value_or(Dictionary()));
@@ -106,6 +99,7 @@ std::optional<Dictionary> BrivoFile::metadataDict() {
   const bool isThere = !std::holds_alternative<std::monostate>(metadata_);
   if (isThere || !hasMetadata_ || updatedExpensiveMetadata_) return metadata();
   if (type() == kTypeImage) buildImageMetadata();
+  if (type() == kTypeMovie) buildMovieMetadata();
   if (std::holds_alternative<std::monostate>(metadata_)) metadata_ = Dictionary();
   if (__OVLogTypeEnabled(kLogTypeDetail))
     OVLog(name(), "metadata for {}: {}\n", name(), describe(*metadata()));

@@ -40,8 +40,8 @@ void BrivoFile::thumbnailDataWithOptions(const Dictionary& options, const Result
 
 std::optional<Data> BrivoFile::thumbnailDataForPixelWidth(std::uint32_t width) {
   startBenchmark();
-  std::optional<Data> data;
-  if (type() == kTypeImage) data = imageThumbnailDataForPixelWidth(width);
+  const std::optional<Data> data =
+      type() == kTypeImage ? imageThumbnailDataForPixelWidth(width) : movieThumbnailDataForPixelWidth(width);
   const std::string response =
       fmt::format("[subImage] {:>10}: [{:>10}b]", "response", data ? data->size() : 0);
   OVLog(name(), "{}", response);

@@ -253,14 +253,6 @@ TEST_F(FileMetadataTest, APictureWithoutASizeIsMissingMetadata) {
   EXPECT_TRUE(request(*file).empty());
 }
 
-TEST_F(FileMetadataTest, AMovieThatCannotBeReadIsUpright) {
-  const auto file = make("MVI_0001.MOV", "no movie at all");
-  EXPECT_EQ(file->imageOrientation(), 1u);
-  EXPECT_EQ(file->thumbSize(), 1u);
-  EXPECT_TRUE(file->updatedBasicMetadata());
-  EXPECT_TRUE(request(*file).empty());
-}
-
 TEST_F(FileMetadataTest, ARawFileHasItsSizeOrientationAndPreviewsWhenItIsMade) {
   const test::StandardErrorCapture log;
   const std::string content = rawFile(6);

@@ -9,6 +9,7 @@ extern "C" {
 #include <algorithm>
 #include <limits>
 #include <span>
+#include <utility>
 
 namespace brivo::imaging {
 
@@ -89,6 +90,7 @@ std::int64_t MovieInput::seekTo(void* opaque, std::int64_t offset, int whence) {
 }
 
 void MovieInput::completeStreams() {
+  if (std::exchange(isComplete_, true)) return;  // the library cannot do it twice
   bytes_.left = kMostOfStreams;
   (void)avformat_find_stream_info(context_, nullptr);  // what it has found before it failed counts
 }

@@ -52,6 +52,7 @@ class MovieInput {
   Bytes bytes_;
   AVIOContext* reader_ = nullptr;
   AVFormatContext* context_ = nullptr;
+  bool isComplete_ = false;  ///< as far as it gets
 };
 
 /// Its pictures are shown one after the other, and it is not a picture that stands for the movie.

@@ -104,10 +104,11 @@ void assumeColours(AVFrame& frame, const VideoFormatDescription& format) {
 
 /// Of the first video track, with the size of its pictures if that can be found out.
 VideoStorage completeStorage(MovieInput& input, const AVStream& stream) {
-  const VideoStorage storage = storageOf(stream, input.source());
+  const SampleEntries entries = sampleEntriesOf(input);
+  const VideoStorage storage = storageOf(stream, entries);
   if (storage.format.width != 0 && storage.format.height != 0) return storage;
   input.completeStreams();
-  return storageOf(stream, input.source());
+  return storageOf(stream, entries);
 }
 
 Frame decodeFirst(MovieInput& input, const AVStream& stream, const VideoFormatDescription& format,

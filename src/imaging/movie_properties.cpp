@@ -12,7 +12,6 @@ extern "C" {
 #include <string_view>
 
 #include "imaging/movie_request.h"
-#include "imaging/sample_entry.h"
 
 namespace brivo::imaging {
 
@@ -54,8 +53,8 @@ AffineTransform transformOf(const AVStream& stream) {
   return {element(0), element(1), element(3), element(4), element(6), element(7)};
 }
 
-VideoTrack trackOf(const AVStream& stream, const images::ByteSource& source) {
-  const VideoStorage storage = storageOf(stream, source);
+VideoTrack trackOf(const AVStream& stream, const SampleEntries& entries) {
+  const VideoStorage storage = storageOf(stream, entries);
   VideoTrack track{transformOf(stream), storage.decodable, {}};
   if (storage.format.width != 0 && storage.format.height != 0)
     track.formatDescriptions.push_back(storage.format);
@@ -103,8 +102,14 @@ VideoFormatDescription formatOf(const AVStream& stream) {
 
 }  // namespace
 
-VideoStorage storageOf(const AVStream& stream, const images::ByteSource& source) {
-  const auto entry = firstSampleEntry(source, static_cast<std::uint32_t>(stream.id));
+SampleEntries sampleEntriesOf(const MovieInput& input) {
+  const bool isIsoMedia = std::string_view(input.container().iformat->name).starts_with("mov,");
+  return isIsoMedia ? firstSampleEntries(input.source()) : SampleEntries();
+}
+
+VideoStorage storageOf(const AVStream& stream, const SampleEntries& entries) {
+  const auto found = entries.find(static_cast<std::uint32_t>(stream.id));
+  const SampleEntry* entry = found == entries.end() ? nullptr : &found->second;
   // The tag of a key is all that is left of the encryption in Matroska.
   const bool isEncrypted =
       (entry && entry->encrypted) || av_dict_get(stream.metadata, "enc_key_id", nullptr, 0);
@@ -122,8 +127,9 @@ std::optional<MovieDescription> describeMovie(const images::ByteSource& source) 
   if (!saysEverything(container)) input->completeStreams();
   MovieDescription movie;
   movie.duration = durationOf(container);
+  const SampleEntries entries = sampleEntriesOf(*input);
   for (const AVStream* stream : streamsOf(container)) {
-    if (isVideo(*stream)) movie.videoTracks.push_back(trackOf(*stream, source));
+    if (isVideo(*stream)) movie.videoTracks.push_back(trackOf(*stream, entries));
   }
   movie.metadata = metadataOf(container);
   return movie;

@@ -5,6 +5,7 @@
 
 #include "imaging/movie_input.h"
 #include "imaging/picture.h"
+#include "imaging/sample_entry.h"
 #include "platform/images/byte_source.h"
 #include "platform/movies/movie_reader.h"
 
@@ -15,7 +16,10 @@ struct VideoStorage {
   bool decodable = false;         ///< there is a decoder, and they are not encrypted
   VideoFormatDescription format;  ///< the first of the track; its size is 0 where that is not known
 };
-VideoStorage storageOf(const AVStream& stream, const images::ByteSource& source);
+/// `entries` are those of the stream's movie.
+VideoStorage storageOf(const AVStream& stream, const SampleEntries& entries);
+/// None where the container has no such thing.
+SampleEntries sampleEntriesOf(const MovieInput& input);
 
 // As MovieReader says. Pure but for memory.
 

@@ -2,6 +2,7 @@
 #include "imaging/sample_entry.h"
 
 #include <bit>
+#include <optional>
 
 #include "platform/images/iso_boxes.h"
 
@@ -38,14 +39,6 @@ std::uint32_t idOf(Parse& parse, const Box& track) {
   const bool wideTimes = images::fullBoxHeader(content).version == 1;
   content.skip(wideTimes ? 2 * sizeof(std::uint64_t) : 2 * sizeof(std::uint32_t));
   return content.u32();
-}
-
-Box trackWith(Parse& parse, std::uint32_t id) {
-  Boxes boxes(parse, movieBox(parse));
-  while (const auto box = boxes.next()) {
-    if (box->type == fourCharacters("trak") && idOf(parse, *box) == id) return *box;
-  }
-  return {};
 }
 
 Box firstEntry(Parse& parse, const Box& track) {
@@ -88,12 +81,7 @@ void readPixelShape(Parse& parse, const Box& entry, VideoFormatDescription& form
   format.verticalSpacing = vertical;
 }
 
-}  // namespace
-
-std::optional<SampleEntry> firstSampleEntry(const images::ByteSource& source, std::uint32_t trackId) {
-  Parse parse(source, images::Scope::basics);
-  parse.ranges.allow(kForMovieBoxes);
-  const Box box = firstEntry(parse, trackWith(parse, trackId));
+std::optional<SampleEntry> readEntry(Parse& parse, const Box& box) {
   auto content = contentOf(parse, box, kBeforeBoxesOfEntry);
   content.skip(kBeforeSize);
   SampleEntry entry;
@@ -104,6 +92,21 @@ std::optional<SampleEntry> firstSampleEntry(const images::ByteSource& source, st
   readPixelShape(parse, box, entry.format);
   entry.format.cleanAperture = cleanAperture(parse, box, entry.format);
   return entry;
+}
+
+}  // namespace
+
+SampleEntries firstSampleEntries(const images::ByteSource& source) {
+  Parse parse(source, images::Scope::basics);
+  parse.ranges.allow(kForMovieBoxes);
+  SampleEntries entries;
+  Boxes boxes(parse, movieBox(parse));
+  while (const auto track = boxes.next()) {
+    if (track->type != fourCharacters("trak")) continue;
+    if (const auto entry = readEntry(parse, firstEntry(parse, *track)))
+      entries.try_emplace(idOf(parse, *track), *entry);
+  }
+  return entries;
 }
 
 }  // namespace brivo::imaging

@@ -2,7 +2,7 @@
 #pragma once
 
 #include <cstdint>
-#include <optional>
+#include <map>
 
 #include "platform/images/byte_source.h"
 #include "platform/movies/movie_description.h"
@@ -15,8 +15,11 @@ struct SampleEntry {
   VideoFormatDescription format;
 };
 
-/// The first one of the track with this id, as far as the file says it. None when there is none, or the file
-/// is no ISO base media or QuickTime file. Pure but for memory, and bounded.
-std::optional<SampleEntry> firstSampleEntry(const images::ByteSource& source, std::uint32_t trackId);
+/// By the id of their track.
+using SampleEntries = std::map<std::uint32_t, SampleEntry>;
+
+/// The first one of each track of an ISO base media or QuickTime file that has one, as far as the file says
+/// it. Reads 1 MiB at most. Pure but for memory.
+SampleEntries firstSampleEntries(const images::ByteSource& source);
 
 }  // namespace brivo::imaging

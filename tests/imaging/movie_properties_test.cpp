@@ -177,6 +177,36 @@ TEST(MoviePropertiesTest, EncryptedTracksAreNotDecodable) {
   EXPECT_EQ(track.formatDescriptions.size(), 1u);
 }
 
+/// An element of EBML (RFC 8794), its length in eight bytes.
+std::string element(std::string_view id, std::string_view content) {
+  return std::string(id) + "\x01" + test::big(content.size(), 7) + std::string(content);
+}
+
+/// A Matroska file (RFC 9559) with one track of VP8 and `encodings` of it.
+std::string matroska(const std::string& encodings) {
+  const std::string size = element("\xB0", test::big(64, 2)) + element("\xBA", test::big(48, 2));
+  const std::string track = element("\xD7", "\x01") + element("\x73\xC5", "\x01") + element("\x83", "\x01") +
+                            element("\x86", "V_VP8") + element("\xE0", size) + encodings;
+  const std::string seconds(std::string_view("\x40\x9F\x40\0\0\0\0\0", 8));  // 2,000 ticks
+  const std::string info = element("\x2A\xD7\xB1", test::big(1'000'000, 4)) + element("\x44\x89", seconds);
+  const std::string cluster = element("\x1F\x43\xB6\x75", element("\xE7", std::string(1, '\0')));
+  const std::string tracks = element("\x16\x54\xAE\x6B", element("\xAE", track));
+  return element("\x1A\x45\xDF\xA3", element("\x42\x82", "matroska")) +
+         element("\x18\x53\x80\x67", element("\x15\x49\xA9\x66", info) + tracks + cluster);
+}
+
+TEST(MoviePropertiesTest, EncryptedTracksOfMatroskaAreNotDecodable) {
+  const std::string key = element("\x47\xE1", "\x05") + element("\x47\xE2", "the key's name");
+  const std::string encoding = element("\x50\x33", "\x01") + element("\x50\x35", key);
+  for (const bool encrypted : {false, true}) {
+    const auto movie =
+        describe(matroska(encrypted ? element("\x6D\x80", element("\x62\x40", encoding)) : ""));
+    ASSERT_TRUE(movie && movie->videoTracks.size() == 1);
+    EXPECT_EQ(movie->videoTracks[0].decodable, !encrypted);
+    EXPECT_EQ(movie->duration, 2);
+  }
+}
+
 TEST(MoviePropertiesTest, UnknownCodecsAreNotDecodable) {
   EXPECT_FALSE(trackOf({.format = "zzzz"}).decodable);
   EXPECT_TRUE(trackOf({.format = "jpeg"}).decodable);

@@ -7,6 +7,7 @@ extern "C" {
 }
 
 #include <cstdint>
+#include <ostream>
 #include <string>
 #include <utility>
 #include <vector>
@@ -24,6 +25,11 @@ struct MadeMovie {
   std::vector<std::pair<std::string, std::string>> muxerOptions = {};
   std::vector<std::pair<std::string, std::string>> metadata = {};
 };
+
+/// How tests call it.
+inline void PrintTo(const MadeMovie& movie, std::ostream* out) {
+  *out << movie.encoder << " in " << movie.container;
+}
 
 /// Its pictures are madeFrame(), each a little brighter than the one before. Throws when the library cannot
 /// make it.

@@ -293,7 +293,7 @@ INSTANTIATE_TEST_SUITE_P(
     MoviePropertiesTest, ContainerTest,
     testing::Values(
         MadeMovie{.container = "mov", .encoder = "libx264"},
-        MadeMovie{.container = "mp4", .encoder = "libx265"},
+        MadeMovie{.container = "mp4", .encoder = "mpeg4"},
         MadeMovie{.container = "ipod", .encoder = "libx264"},
         MadeMovie{.container = "mov", .encoder = "prores_ks", .format = AV_PIX_FMT_YUV422P10},
         MadeMovie{.container = "mov", .encoder = "mjpeg", .format = AV_PIX_FMT_YUVJ420P},

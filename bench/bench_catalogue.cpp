@@ -8,6 +8,7 @@
 #include "bare_walk.h"
 #include "echo_process.h"
 #include "in_process_catalogue.h"
+#include "movie_figures.h"
 #include "options.h"
 #include "picture_figures.h"
 #include "raw_figure.h"
@@ -185,5 +186,6 @@ int main(int count, char** words) {
     compareSizes(options);
     printPictureFigures(options);
     printRawFigure(options);
+    printMovieFigures(options);
   });
 }

@@ -4,6 +4,7 @@
 #include "device_thumbnail_figure.h"
 #include "embedded_thumbnail_figures.h"
 #include "heic_figures.h"
+#include "movie_frame_figures.h"
 #include "options.h"
 #include "raw_preview_figures.h"
 #include "worker_figures.h"
@@ -17,5 +18,6 @@ int main(int count, char** words) {
     printDeviceThumbnailFigure(options);
     printWorkerFigures(options);
     printHeicFigures(options);
+    printMovieFrameFigures(options);
   });
 }

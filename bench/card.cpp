@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <array>
 #include <cstdio>
+#include <filesystem>
 #include <stdexcept>
 
 #include "platform/base/unique_fd.h"
@@ -51,6 +52,14 @@ FileMaker ofNothing(std::uint64_t size) {
     if (::ftruncate(created(path).get(), static_cast<off_t>(size)) != 0) {
       throw std::runtime_error("cannot make " + path + " so large");
     }
+  };
+}
+
+FileMaker asLinkTo(const std::string& file) {
+  return [file](const std::string& path) {
+    std::error_code error;
+    std::filesystem::create_hard_link(file, path, error);
+    if (error) throw std::runtime_error("cannot link " + path + " to " + file + ": " + error.message());
   };
 }
 

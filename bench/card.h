@@ -16,9 +16,11 @@ using FileMaker = std::function<void(const std::string& path)>;
 FileMaker ofBytes(std::uint64_t size);
 /// A file of `size` bytes without a block on the disk: it reads as zeros.
 FileMaker ofNothing(std::uint64_t size);
+/// One more name of the file at `path`, which is on the file system of the cards.
+FileMaker asLinkTo(const std::string& path);
 
 /// A camera card in a temporary folder: "DCIM/100ABCDE/IMG_0001.JPG", or with another extension, and so on,
-/// 999 files in a folder, each an inode of its own.
+/// 999 files in a folder.
 class Card {
  public:
   /// A card with `files` files that hold `content`.

@@ -56,11 +56,7 @@ Pictures::Pictures(std::unique_ptr<test::TemporaryFolder> folder, const std::str
 }
 
 FileMaker Pictures::inOrder() const {
-  return [this, next = paths_.begin()](const std::string& path) mutable {
-    std::error_code error;
-    fs::create_hard_link(*next++, path, error);
-    if (error) throw std::runtime_error("cannot link " + path + " to a picture: " + error.message());
-  };
+  return [this, next = paths_.begin()](const std::string& path) mutable { asLinkTo (*next++)(path); };
 }
 
 }  // namespace brivo::bench

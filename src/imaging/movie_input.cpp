@@ -32,6 +32,13 @@ AVInputFormat* const kAnyFormat = nullptr;
 
 }  // namespace
 
+MovieInput::AllocationLimit::AllocationLimit() {
+  constexpr std::size_t kMostAtOnce = std::size_t{256} << 20;  // a table of 11 million samples
+  av_max_alloc(kMostAtOnce);
+}
+
+MovieInput::AllocationLimit::~AllocationLimit() { av_max_alloc(std::numeric_limits<int>::max()); }
+
 std::unique_ptr<MovieInput> MovieInput::open(const images::ByteSource& source) {
   std::unique_ptr<MovieInput> input(new MovieInput(source));
   return input->openContext() ? std::move(input) : nullptr;

@@ -36,6 +36,13 @@ class MovieInput {
   Packet next();
 
  private:
+  /// Keeps what libavformat allocates at once small in this process: it believes the counts of a movie.
+  struct AllocationLimit {
+    AllocationLimit();
+    ~AllocationLimit();
+    AllocationLimit(const AllocationLimit&) = delete;
+    AllocationLimit& operator=(const AllocationLimit&) = delete;
+  };
   /// What libavformat reads from.
   struct Bytes {
     const images::ByteSource& source;
@@ -49,6 +56,7 @@ class MovieInput {
   static int readBytes(void* opaque, std::uint8_t* buffer, int size);
   static std::int64_t seekTo(void* opaque, std::int64_t offset, int whence);
 
+  const AllocationLimit limit_;
   Bytes bytes_;
   AVIOContext* reader_ = nullptr;
   AVFormatContext* context_ = nullptr;

@@ -178,6 +178,16 @@ TEST(MovieFrameTest, NothingIsReadWithoutEnd) {
   EXPECT_LT(source.bytesRead(), std::size_t{70} << 20);
 }
 
+/// A stream without a header that does not say the size of its pictures either.
+TEST(MovieFrameTest, AStreamThatKeepsItsSizeToItselfShowsNothing) {
+  const std::string file = test::readFile(BRIVOD_SOURCE_DIR "/fuzz/seeds/decode_movie/unknown_size.mts");
+  const MemorySource source(std::as_bytes(std::span(file)));
+  const auto movie = describeMovie(source);
+  ASSERT_TRUE(movie && movie->videoTracks.size() == 1);
+  EXPECT_TRUE(movie->videoTracks[0].formatDescriptions.empty());
+  EXPECT_FALSE(firstFrameOf(source, {160, 0}));
+}
+
 TEST(MovieFrameTest, TheReaderGivesAJpeg) {
   LocalMovieReader reader;
   const auto jpeg = reader.firstFrame(test::fileWith(movieOf({.width = 640, .height = 480})), {160, 0});

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include "imaging/descriptor_source.h"
@@ -285,6 +286,24 @@ TEST(MoviePropertiesTest, OfAMovieOf100GiBTheIndexAtItsEndIsRead) {
   EXPECT_LT(source.bytesRead, kMostBesidesIndex + index.size());
   EXPECT_TRUE(firstFrameOf(source, {32, 0}));
   EXPECT_LT(source.bytesRead, 2 * (kMostBesidesIndex + index.size()));
+}
+
+/// Most memory that this process has had, in bytes.
+std::uint64_t peakMemory() {
+  rusage usage{};
+  ::getrusage(RUSAGE_SELF, &usage);
+  return static_cast<std::uint64_t>(usage.ru_maxrss) * 1024;
+}
+
+TEST(MoviePropertiesTest, AFragmentThatClaimsManySamplesCostsLittleMemory) {
+  std::string file = test::madeMovie({.muxerOptions = {{"movflags", "frag_keyframe+empty_moov"}}});
+  const std::size_t run = file.find("trun");
+  ASSERT_NE(run, std::string::npos);
+  // ISO/IEC 14496-12 section 8.8.8: no values for single samples, and their number.
+  file.replace(run + 4, 8, test::big(0, 4) + test::big(0x0400'0000, 4));
+  const std::uint64_t before = peakMemory();
+  (void)describe(file);
+  EXPECT_LT(peakMemory() - before, std::uint64_t{512} << 20);
 }
 
 class ContainerTest : public testing::TestWithParam<MadeMovie> {};

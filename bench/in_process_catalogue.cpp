@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "in_process_catalogue.h"
 
-#include <unistd.h>
-
 #include <future>
 
 #include "protocol/keys.h"
@@ -39,7 +37,7 @@ class CountingClient final : public zeph::Connection {
   void call(std::string_view, zeph::Arguments, std::chrono::milliseconds, zeph::AnswerHandler) override {}
 
   const std::shared_ptr<CatalogueRecorder> recorder_;
-  const AuditToken token_ = AuditToken::ofProcess(::getpid(), ::getuid());
+  const AuditToken token_ = AuditToken::ofThisProcess();
 };
 
 void startUsing(BrivoDevice& device) {

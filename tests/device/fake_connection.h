@@ -13,7 +13,7 @@ namespace brivo {
 
 class FakeConnection : public zeph::Connection {
  public:
-  explicit FakeConnection(std::int32_t pid) : token_(AuditToken::ofProcess(pid, 0)) {}
+  explicit FakeConnection(std::int32_t pid) : token_(AuditToken::ofCredentials({pid, 0, 0})) {}
 
   const AuditToken& auditToken() const override { return token_; }
   void setExportedInterface(zeph::Interface) override {}

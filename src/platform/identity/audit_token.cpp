@@ -6,6 +6,8 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <cerrno>
+
 #ifndef SO_PEERPIDFD
 #define SO_PEERPIDFD 77
 #endif
@@ -14,32 +16,30 @@ namespace brivo {
 
 namespace {
 
-UniqueFd openPidfd(pid_t pid) { return UniqueFd(static_cast<int>(::syscall(SYS_pidfd_open, pid, 0))); }
+UniqueFd openPidfd(pid_t pid) {
+  return pid > 0 ? UniqueFd(static_cast<int>(::syscall(SYS_pidfd_open, pid, 0))) : UniqueFd();
+}
 
 }  // namespace
 
 AuditToken AuditToken::ofPeer(int fd) {
-  ucred credentials{-1, static_cast<uid_t>(-1), static_cast<gid_t>(-1)};
-  socklen_t size = sizeof credentials;
-  if (::getsockopt(fd, SOL_SOCKET, SO_PEERCRED, &credentials, &size) != 0 || credentials.pid <= 0) {
-    return AuditToken(-1, credentials.uid, UniqueFd());
-  }
-  int raw = -1;
-  size = sizeof raw;
-  UniqueFd pidfd;
-  if (::getsockopt(fd, SOL_SOCKET, SO_PEERPIDFD, &raw, &size) == 0) {
-    pidfd.reset(raw);
-  } else {
-    pidfd = openPidfd(credentials.pid);
-  }
-  return AuditToken(credentials.pid, credentials.uid, std::move(pidfd));
+  ucred peer{};
+  socklen_t size = sizeof peer;
+  if (::getsockopt(fd, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return AuditToken({}, UniqueFd());
+  const Credentials credentials{peer.pid > 0 ? peer.pid : -1, peer.uid, peer.gid};
+  int pidfd = -1;
+  size = sizeof pidfd;
+  if (::getsockopt(fd, SOL_SOCKET, SO_PEERPIDFD, &pidfd, &size) == 0)
+    return AuditToken(credentials, UniqueFd(pidfd));
+  // Any other error is of a peer that has gone, whose process identifier may be somebody else's by now.
+  return errno == ENOPROTOOPT ? ofCredentials(credentials) : AuditToken(credentials, UniqueFd());
 }
 
-AuditToken AuditToken::ofProcess(std::int32_t pid, std::uint32_t uid) {
-  return AuditToken(pid, uid, openPidfd(pid));
+AuditToken AuditToken::ofCredentials(const Credentials& credentials, UniqueFd pidfd) {
+  return AuditToken(credentials, pidfd ? std::move(pidfd) : openPidfd(credentials.pid));
 }
 
-AuditToken AuditToken::ofThisProcess() { return ofProcess(::getpid(), ::getuid()); }
+AuditToken AuditToken::ofThisProcess() { return ofCredentials({::getpid(), ::getuid(), ::getgid()}); }
 
 bool AuditToken::isAlive() const {
   pollfd exit{pidfd(), POLLIN, 0};

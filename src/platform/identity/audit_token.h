@@ -13,17 +13,26 @@ namespace brivo {
 /// another process; the pidfd never does. *Immutable*; copies share the pidfd.
 class AuditToken {
  public:
+  /// As in SCM_CREDENTIALS (unix(7)); -1 for what is not known.
+  struct Credentials {
+    std::int32_t pid = -1;
+    std::uint32_t uid = static_cast<std::uint32_t>(-1);
+    std::uint32_t gid = static_cast<std::uint32_t>(-1);
+  };
+
   /// The process that connected to (or made the pair of) the unix socket `fd`: SO_PEERCRED and
   /// SO_PEERPIDFD (Linux 6.5), else pidfd_open(2) of the credential's process identifier, which
   /// leaves a window in which that could already be another process. Call it right after accept(2).
   static AuditToken ofPeer(int fd);
-  /// The process that has the identifier now, which the caller must know to be the right one.
-  static AuditToken ofProcess(std::int32_t pid, std::uint32_t uid);
+  /// The process that somebody trusted vouches for, such as a message bus for one of its clients. Without a
+  /// `pidfd` it is the process that has the identifier now, which the caller must know to be the right one.
+  static AuditToken ofCredentials(const Credentials& credentials, UniqueFd pidfd = UniqueFd());
   static AuditToken ofThisProcess();
 
   /// -1 when the kernel did not tell.
-  std::int32_t processIdentifier() const { return pid_; }
-  std::uint32_t userIdentifier() const { return uid_; }
+  std::int32_t processIdentifier() const { return credentials_.pid; }
+  std::uint32_t userIdentifier() const { return credentials_.uid; }
+  std::uint32_t groupIdentifier() const { return credentials_.gid; }
   /// Borrowed; -1 when there is none.
   int pidfd() const { return pidfd_ ? pidfd_->get() : -1; }
 
@@ -31,11 +40,10 @@ class AuditToken {
   bool isAlive() const;
 
  private:
-  AuditToken(std::int32_t pid, std::uint32_t uid, UniqueFd pidfd)
-      : pid_(pid), uid_(uid), pidfd_(std::make_shared<const UniqueFd>(std::move(pidfd))) {}
+  AuditToken(const Credentials& credentials, UniqueFd pidfd)
+      : credentials_(credentials), pidfd_(std::make_shared<const UniqueFd>(std::move(pidfd))) {}
 
-  std::int32_t pid_ = -1;
-  std::uint32_t uid_ = 0;
+  Credentials credentials_;
   std::shared_ptr<const UniqueFd> pidfd_;
 };
 

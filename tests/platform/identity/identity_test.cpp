@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: MIT
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -30,6 +32,7 @@ TEST(AuditTokenTest, ThePeerOfAPairIsThisProcess) {
   const AuditToken token = AuditToken::ofPeer(a.get());
   EXPECT_EQ(token.processIdentifier(), ::getpid());
   EXPECT_EQ(token.userIdentifier(), ::getuid());
+  EXPECT_EQ(token.groupIdentifier(), ::getgid());
   EXPECT_GE(token.pidfd(), 0);
   EXPECT_TRUE(token.isAlive());
 }
@@ -37,6 +40,34 @@ TEST(AuditTokenTest, ThePeerOfAPairIsThisProcess) {
 TEST(AuditTokenTest, WhatIsNoSocketHasNoPeer) {
   const AuditToken token = AuditToken::ofPeer(-1);
   EXPECT_EQ(token.processIdentifier(), -1);
+  EXPECT_FALSE(token.isAlive());
+}
+
+TEST(AuditTokenTest, CredentialsFromElsewhereAreTakenAsTheyAre) {
+  const AuditToken token = AuditToken::ofCredentials({::getpid(), 12, 34});
+  EXPECT_EQ(token.processIdentifier(), ::getpid());
+  EXPECT_EQ(token.userIdentifier(), 12u);
+  EXPECT_EQ(token.groupIdentifier(), 34u);
+  EXPECT_TRUE(token.isAlive());
+}
+
+TEST(AuditTokenTest, APidfdFromElsewhereIsOwnedByTheToken) {
+  UniqueFd pidfd(static_cast<int>(::syscall(SYS_pidfd_open, ::getpid(), 0)));
+  const int number = pidfd.get();
+  {
+    const AuditToken token =
+        AuditToken::ofCredentials({::getpid(), ::getuid(), ::getgid()}, std::move(pidfd));
+    EXPECT_EQ(token.pidfd(), number);
+    EXPECT_TRUE(token.isAlive());
+  }
+  EXPECT_EQ(::fcntl(number, F_GETFD), -1);
+}
+
+TEST(AuditTokenTest, UnknownCredentialsAreNoProcess) {
+  const AuditToken token = AuditToken::ofCredentials({});
+  EXPECT_EQ(token.processIdentifier(), -1);
+  EXPECT_EQ(token.userIdentifier(), static_cast<std::uint32_t>(-1));
+  EXPECT_EQ(token.pidfd(), -1);
   EXPECT_FALSE(token.isAlive());
 }
 

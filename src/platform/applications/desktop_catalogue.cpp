@@ -1,31 +1,32 @@
 // SPDX-License-Identifier: MIT
 #include "platform/applications/desktop_catalogue.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
 #include <cstdlib>
-#include <fstream>
-#include <iterator>
 
 #include "platform/applications/desktop_entry.h"
 #include "platform/base/directory.h"
 #include "platform/base/paths.h"
+#include "platform/base/small_file.h"
+#include "platform/base/unique_fd.h"
 
 namespace brivo {
 
 namespace {
 
 constexpr int kDeepestFolder = 4;
-constexpr std::streamsize kLargestFile = 262'144;
-/// A folder that changed less than this before it was read may change again without its time telling.
+constexpr std::size_t kLargestFile = 262'144;
+/// What changed less than this before it was read may change again without its time telling.
 constexpr std::int64_t kTimeGranularity = 2'000'000'000;
 
-std::int64_t changeTime(const std::string& folder) {
+std::int64_t changeTime(const std::string& path) {
   struct stat status {};
-  if (::stat(folder.c_str(), &status) != 0) return -1;
+  if (::stat(path.c_str(), &status) != 0) return -1;
   return std::int64_t{status.st_mtim.tv_sec} * 1'000'000'000 + status.st_mtim.tv_nsec;
 }
 
@@ -59,12 +60,9 @@ std::string resolved(const std::string& program) {
   return {};
 }
 
-std::string readText(const std::string& path) {
-  std::ifstream file(path, std::ios::binary);
-  std::string text(kLargestFile, '\0');
-  file.read(text.data(), kLargestFile);
-  text.resize(static_cast<std::size_t>(file.gcount()));
-  return text;
+std::optional<std::string> readText(const std::string& path) {
+  const UniqueFd fd(::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
+  return readSmallFile(fd.get(), kLargestFile);
 }
 
 }  // namespace
@@ -98,10 +96,10 @@ std::optional<std::string> DesktopCatalogue::identifierOfProgram(dev_t device, i
 }
 
 void DesktopCatalogue::refresh() const {
-  const auto unchanged = [](const auto& folder) { return changeTime(folder.first) == folder.second; };
-  if (settled_ && std::ranges::all_of(folders_, unchanged)) return;
+  const auto unchanged = [](const auto& entry) { return changeTime(entry.first) == entry.second; };
+  if (settled_ && std::ranges::all_of(times_, unchanged)) return;
   applications_.clear();
-  folders_.clear();
+  times_.clear();
   readFolder(appendingPathComponent(userDataDir_, "applications"), "", true);
   readFolder(appendingPathComponent(userDataDir_, "flatpak/exports/share/applications"), "", true);
   for (const std::string& folder : dataDirs_)
@@ -111,14 +109,14 @@ void DesktopCatalogue::refresh() const {
     readFolder(folder, "", false);
   }
   const std::int64_t time = now();
-  settled_ = std::ranges::all_of(folders_,
-                                 [&](const auto& folder) { return time - folder.second > kTimeGranularity; });
+  settled_ =
+      std::ranges::all_of(times_, [&](const auto& entry) { return time - entry.second > kTimeGranularity; });
 }
 
 /// A file in a sub-folder has the folder's name and a dash before its own in its id.
 void DesktopCatalogue::readFolder(const std::string& folder, const std::string& prefix, bool ofUser) const {
-  if (folders_.contains(folder) || std::ranges::count(prefix, '-') >= kDeepestFolder) return;
-  folders_[folder] = changeTime(folder);
+  if (times_.contains(folder) || std::ranges::count(prefix, '-') >= kDeepestFolder) return;
+  times_[folder] = changeTime(folder);
   const Directory directory = listDirectory(folder);
   if (!directory) return;
   std::vector<std::string> names;
@@ -136,9 +134,10 @@ void DesktopCatalogue::readFolder(const std::string& folder, const std::string& 
 
 void DesktopCatalogue::readFile(const std::string& path, const std::string& identifier, bool ofUser) const {
   if (ofUser && identifier.starts_with(vendorPrefix_)) return;
-  if (const auto entry = parseDesktopEntry(readText(path))) {
-    applications_.push_back({identifier, resolved(entry->program)});
-  }
+  times_[path] = changeTime(path);
+  const auto text = readText(path);
+  const auto entry = text ? parseDesktopEntry(*text) : std::nullopt;
+  if (entry) applications_.push_back({identifier, resolved(entry->program)});
 }
 
 }  // namespace brivo

@@ -9,7 +9,7 @@
 
 namespace brivo {
 
-/// The desktop files of this machine, read again when one of their folders has changed.
+/// The desktop files of this machine, read again when one of them or of their folders has changed.
 class DesktopCatalogue final : public InstalledApplications {
  public:
   /// `userDataDir` is the user's own data folder, `dataDirs` the system's. An id that begins with
@@ -25,8 +25,8 @@ class DesktopCatalogue final : public InstalledApplications {
     std::string identifier;
     std::string program;  ///< absolute path, empty when it was not found
   };
-  /// When a folder was last changed, in nanoseconds since 1970; -1 when it is not there.
-  using FolderTimes = std::map<std::string, std::int64_t>;
+  /// When a file or folder was last changed, in nanoseconds since 1970; -1 when it is not there.
+  using ChangeTimes = std::map<std::string, std::int64_t>;
 
   void refresh() const BRIVO_REQUIRES(mutex_);
   void readFolder(const std::string& folder, const std::string& prefix, bool ofUser) const
@@ -40,8 +40,8 @@ class DesktopCatalogue final : public InstalledApplications {
 
   mutable Mutex mutex_;
   mutable std::vector<Application> applications_ BRIVO_GUARDED_BY(mutex_);  // by precedence
-  mutable FolderTimes folders_ BRIVO_GUARDED_BY(mutex_);
-  mutable bool settled_ BRIVO_GUARDED_BY(mutex_) = false;  // no folder had changed just before it was read
+  mutable ChangeTimes times_ BRIVO_GUARDED_BY(mutex_);
+  mutable bool settled_ BRIVO_GUARDED_BY(mutex_) = false;  // nothing had changed just before it was read
 };
 
 }  // namespace brivo

@@ -82,6 +82,34 @@ TEST_F(DesktopCatalogueTest, ChangesAreSeen) {
   EXPECT_FALSE(catalogue.isInstalled("a"));
 }
 
+TEST_F(DesktopCatalogueTest, AFileThatIsWrittenAnewInItsPlaceIsReadAgain) {
+  const std::string first = makeProgram("first");
+  const std::string second = makeProgram("second");
+  const std::string file = folder / "system/applications/a.desktop";
+  const auto longAgo = std::filesystem::file_time_type::clock::now() - std::chrono::hours(1);
+  install("system", "a.desktop", first);
+  std::filesystem::last_write_time(file, longAgo);
+  std::filesystem::last_write_time(folder / "system/applications", longAgo);
+  EXPECT_EQ(identifierOf(first), "a");
+  install("system", "a.desktop", second);
+  EXPECT_EQ(identifierOf(first), std::nullopt);
+  EXPECT_EQ(identifierOf(second), "a");
+}
+
+TEST_F(DesktopCatalogueTest, WhatIsNoReadableFileIsPassedOver) {
+  const std::string program = makeProgram("photos");
+  const std::string applications = folder / "user/applications";
+  test::makeFolder(applications + "/folder.desktop");
+  ASSERT_EQ(::mkfifo((applications + "/fifo.desktop").c_str(), 0600), 0);
+  std::filesystem::create_symlink("/dev/zero", applications + "/device.desktop");
+  std::filesystem::create_symlink("nothing", applications + "/dangling.desktop");
+  test::writeFile(applications + "/huge.desktop",
+                  "[Desktop Entry]\nType=Application\nExec=" + program + "\n");
+  std::filesystem::resize_file(applications + "/huge.desktop", std::uintmax_t{1} << 40);
+  install("user", "photos.desktop", program);
+  EXPECT_EQ(identifierOf(program), "photos");
+}
+
 TEST_F(DesktopCatalogueTest, AnAbsolutePathIsInstalledWhenItIsAnExecutableFile) {
   EXPECT_TRUE(catalogue.isInstalled(makeProgram("photos")));
   test::writeFile(folder / "data", "");

@@ -1,12 +1,17 @@
 // SPDX-License-Identifier: MIT
 #include "platform/identity/audit_token.h"
 
+#include <fcntl.h>
 #include <poll.h>
 #include <sys/socket.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <string>
+
+#include "platform/base/small_file.h"
+#include "platform/identity/process_facts.h"
 
 #ifndef SO_PEERPIDFD
 #define SO_PEERPIDFD 77
@@ -20,7 +25,22 @@ UniqueFd openPidfd(pid_t pid) {
   return pid > 0 ? UniqueFd(static_cast<int>(::syscall(SYS_pidfd_open, pid, 0))) : UniqueFd();
 }
 
+std::optional<std::string> readProcessFile(const std::string& path) {
+  constexpr std::size_t limit = 8192;
+  return readSmallFile(UniqueFd(::open(path.c_str(), O_RDONLY | O_CLOEXEC)).get(), limit);
+}
+
+std::optional<std::uint64_t> startTimeOf(pid_t pid) {
+  const auto text = readProcessFile("/proc/" + std::to_string(pid) + "/stat");
+  return text ? startTimeInStat(*text) : std::nullopt;
+}
+
 }  // namespace
+
+AuditToken::AuditToken(const Credentials& credentials, UniqueFd pidfd, std::optional<std::uint64_t> startTime)
+    : credentials_(credentials),
+      pidfd_(std::make_shared<const UniqueFd>(std::move(pidfd))),
+      startTime_(startTime) {}
 
 AuditToken AuditToken::ofPeer(int fd) {
   ucred peer{};
@@ -36,14 +56,24 @@ AuditToken AuditToken::ofPeer(int fd) {
 }
 
 AuditToken AuditToken::ofCredentials(const Credentials& credentials, UniqueFd pidfd) {
-  return AuditToken(credentials, pidfd ? std::move(pidfd) : openPidfd(credentials.pid));
+  if (!pidfd) pidfd = openPidfd(credentials.pid);
+  if (pidfd || credentials.pid <= 0) return AuditToken(credentials, std::move(pidfd));
+  return AuditToken(credentials, UniqueFd(), startTimeOf(credentials.pid));
 }
 
 AuditToken AuditToken::ofThisProcess() { return ofCredentials({::getpid(), ::getuid(), ::getgid()}); }
 
 bool AuditToken::isAlive() const {
+  if (startTime_) return startTimeOf(credentials_.pid) == startTime_;
   pollfd exit{pidfd(), POLLIN, 0};
   return exit.fd >= 0 && ::poll(&exit, 1, 0) == 0;
+}
+
+std::optional<std::int32_t> AuditToken::currentProcessIdentifier() const {
+  if (startTime_) return credentials_.pid;
+  if (pidfd() < 0) return std::nullopt;
+  const auto text = readProcessFile("/proc/self/fdinfo/" + std::to_string(pidfd()));
+  return text ? processInFdinfo(*text) : std::nullopt;
 }
 
 }  // namespace brivo

@@ -4,13 +4,15 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 
 #include "platform/base/unique_fd.h"
 
 namespace brivo {
 
-/// A process as the kernel knew it when it connected. The process identifier alone may come to mean
-/// another process; the pidfd never does. *Immutable*; copies share the pidfd.
+/// A process as the kernel knew it when it connected. The process identifier alone may come to mean another
+/// process; the pidfd never does. Where none can be had, the time at which the process was started tells it
+/// from a later one with its identifier. *Immutable*; copies share the pidfd.
 class AuditToken {
  public:
   /// As in SCM_CREDENTIALS (unix(7)); -1 for what is not known.
@@ -34,17 +36,21 @@ class AuditToken {
   std::uint32_t userIdentifier() const { return credentials_.uid; }
   std::uint32_t groupIdentifier() const { return credentials_.gid; }
   /// Borrowed; -1 when there is none.
-  int pidfd() const { return pidfd_ ? pidfd_->get() : -1; }
+  int pidfd() const { return pidfd_->get(); }
 
-  /// True while the process has not exited. Without a pidfd nothing can be said, and it is false.
+  /// True while the process has not exited. Of an unknown process nothing can be said, and it is false.
   bool isAlive() const;
+  /// The number of its folder in /proc, which is its own for as long as it is alive: look there first and ask
+  /// isAlive() afterwards. None for a process that has exited, or that has no number in our namespace.
+  std::optional<std::int32_t> currentProcessIdentifier() const;
 
  private:
-  AuditToken(const Credentials& credentials, UniqueFd pidfd)
-      : credentials_(credentials), pidfd_(std::make_shared<const UniqueFd>(std::move(pidfd))) {}
+  AuditToken(const Credentials& credentials, UniqueFd pidfd,
+             std::optional<std::uint64_t> startTime = std::nullopt);
 
   Credentials credentials_;
   std::shared_ptr<const UniqueFd> pidfd_;
+  std::optional<std::uint64_t> startTime_;  // known only where there is no pidfd
 };
 
 }  // namespace brivo

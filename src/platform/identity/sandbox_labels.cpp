@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: MIT
 #include "platform/identity/sandbox_labels.h"
 
-#include <charconv>
+#include <algorithm>
 
 namespace brivo {
 
 namespace {
+
+constexpr std::size_t kLongestApplicationId = 255;
 
 std::string_view nextLine(std::string_view& text) {
   const auto end = text.find('\n');
@@ -14,16 +16,29 @@ std::string_view nextLine(std::string_view& text) {
   return line;
 }
 
+bool isLetterOrDigit(char c) {
+  return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9');
+}
+
+/// Words with dots between them, as in the names of D-Bus: never a path, and nothing that upsets a terminal.
+bool isApplicationId(std::string_view id) {
+  const auto isAllowed = [](char c) { return isLetterOrDigit(c) || c == '_' || c == '-' || c == '.'; };
+  return id.size() <= kLongestApplicationId && id.find('.') != std::string_view::npos &&
+         !id.starts_with('.') && !id.ends_with('.') && id.find("..") == std::string_view::npos &&
+         std::ranges::all_of(id, isAllowed);
+}
+
 }  // namespace
 
 std::optional<std::string> applicationInFlatpakInfo(std::string_view text) {
   bool inApplication = false;
   while (!text.empty()) {
-    const std::string_view line = nextLine(text);
+    std::string_view line = nextLine(text);
     if (line.starts_with('[')) {
       inApplication = line == "[Application]";
-    } else if (inApplication && line.starts_with("name=") && line.size() > 5) {
-      return std::string(line.substr(5));
+    } else if (inApplication && line.starts_with("name=")) {
+      line.remove_prefix(5);
+      return isApplicationId(line) ? std::optional<std::string>(line) : std::nullopt;
     }
   }
   return std::nullopt;
@@ -36,19 +51,6 @@ std::optional<std::string> snapInSecurityLabel(std::string_view label) {
   const auto dot = label.find('.');
   if (dot == std::string_view::npos || dot == 0) return std::nullopt;
   return std::string(label.substr(0, dot));
-}
-
-std::optional<int> processInFdinfo(std::string_view text) {
-  while (!text.empty()) {
-    std::string_view line = nextLine(text);
-    if (!line.starts_with("Pid:")) continue;
-    line.remove_prefix(4);
-    line.remove_prefix(std::min(line.find_first_not_of(" \t"), line.size()));
-    int pid = 0;
-    std::from_chars(line.data(), line.data() + line.size(), pid);
-    return pid > 0 ? std::optional<int>(pid) : std::nullopt;
-  }
-  return std::nullopt;
 }
 
 }  // namespace brivo

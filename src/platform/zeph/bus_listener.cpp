@@ -21,7 +21,9 @@ namespace {
 constexpr int kAcceptsPerTurn = 64;
 constexpr std::chrono::milliseconds kPauseWithoutDescriptors{100};
 
+/// Clients are told apart by their process identifiers; one that has none here would be taken for all others.
 bool mayConnect(const AuditToken& peer) {
+  if (peer.processIdentifier() <= 0) return false;
   const uid_t own = ::getuid();
   return own == 0 || peer.userIdentifier() == own || peer.userIdentifier() == 0;
 }

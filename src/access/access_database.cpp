@@ -25,9 +25,9 @@ std::int64_t flag(bool value) { return value ? 1 : 0; }
 
 }  // namespace
 
-AccessDatabase::AccessDatabase(Pool& pool, const std::string& folder)
-    : deviceAccessQueue_(SerialQueue::create(pool)) {
-  deviceAccessQueue_->runAndWait([&] { open(folder); });
+AccessDatabase::AccessDatabase(Pool& pool, std::string folder)
+    : folder_(std::move(folder)), deviceAccessQueue_(SerialQueue::create(pool)) {
+  deviceAccessQueue_->runAndWait([this] { open(); });
 }
 
 AccessDatabase::~AccessDatabase() {
@@ -36,9 +36,9 @@ AccessDatabase::~AccessDatabase() {
   });
 }
 
-void AccessDatabase::open(const std::string& folder) {
-  if (const auto error = makePrivateFolder(folder)) OVLogError(kTag, "{}", error->text());
-  auto opened = Database::open(appendingPathComponent(folder, "externalMediaAccess.db"));
+void AccessDatabase::open() {
+  if (const auto error = makePrivateFolder(folder_)) OVLogError(kTag, "{}", error->text());
+  auto opened = Database::open(appendingPathComponent(folder_, "externalMediaAccess.db"));
   if (!opened.ok()) {
     OVLogError(kTag, "Failed to open/create database");
     OVLogError(kTag, "{}", opened.error().text());
@@ -55,17 +55,25 @@ void AccessDatabase::createTables() {
                                             " date_added INTEGER, whitelisted INTEGER)");
     if (failure) OVLogError(kTag, "Failed to create table: {} - {}", table, *failure);
   }
-  if (database_->hasColumn("camera_control", "whitelisted")) return;
+  if (database_->hasColumn("camera_control", "whitelisted").value_or(true)) return;
   OVLogError(kTag, "'whitelisted' does not appear in camera_control, updating database");
   if (const auto failure = database_->execute("ALTER TABLE camera_control add whitelisted INTEGER")) {
     OVLogError(kTag, "Failed to create column: camera_control|whitelisted - {}", *failure);
   }
 }
 
+void AccessDatabase::reopenIfLost() {
+  if (!database_ || !database_->hasLostItsFile()) return;
+  OVLogError(kTag, "The database is not where it was, opening it anew");
+  database_.reset();
+  open();
+}
+
 void AccessDatabase::execute(const char* tag, const std::string& statement,
                              std::initializer_list<Database::Binding> bindings,
                              const Database::RowHandler& onRow) {
   deviceAccessQueue_->runAndWait([&] {
+    reopenIfLost();
     if (!database_) return OVLogError(tag, "no database");
     if (const auto failure = database_->execute(statement, bindings, onRow)) OVLogError(tag, "{}", *failure);
   });

@@ -20,8 +20,9 @@ class AccessDatabase {
   enum class Table { access, control };
 
   /// Opens or makes "externalMediaAccess.db" in `folder`, which is made when missing (not those above it),
-  /// and brings an old file up to date. Without a usable file every operation finds nothing.
-  AccessDatabase(Pool& pool, const std::string& folder);
+  /// and brings an old file up to date. Without a usable file every operation finds nothing. A file that is
+  /// removed or replaced later is opened, or made, anew.
+  AccessDatabase(Pool& pool, std::string folder);
   ~AccessDatabase();
   AccessDatabase(const AccessDatabase&) = delete;
   AccessDatabase& operator=(const AccessDatabase&) = delete;
@@ -45,14 +46,16 @@ class AccessDatabase {
   std::vector<Dictionary> rowsOf(const std::string& bundleIdentifier, Table table);
 
  private:
-  void open(const std::string& folder);
+  void open();
   void createTables();
+  void reopenIfLost();
   /// Runs one statement on the queue; what fails is logged under `tag`.
   void execute(const char* tag, const std::string& statement,
                std::initializer_list<Database::Binding> bindings = {},
                const Database::RowHandler& onRow = nullptr);
   std::vector<std::string> list(const char* tag, const std::string& statement);
 
+  const std::string folder_;
   const std::shared_ptr<SerialQueue> deviceAccessQueue_;
   std::unique_ptr<Database> database_;  // on the queue only; null when it could not be opened
 };

@@ -4,17 +4,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <atomic>
+#include <algorithm>
 #include <ctime>
-#include <thread>
 
-#include "support/processes.h"
+#include "database_fixture.h"
 #include "support/standard_error.h"
-#include "support/temporary_folder.h"
-#include "support/wait.h"
 
 namespace brivo {
 namespace {
@@ -25,26 +20,14 @@ using testing::IsEmpty;
 using testing::SizeIs;
 using Table = AccessDatabase::Table;
 
-class AccessDatabaseTest : public testing::Test {
- protected:
-  std::string folder() const { return home / "org.orvid.imagecapture"; }
-  std::string file() const { return folder() + "/externalMediaAccess.db"; }
-  std::unique_ptr<AccessDatabase> open() { return std::make_unique<AccessDatabase>(pool, folder()); }
-  std::unique_ptr<Database> plain() {
-    test::makeFolder(folder());
-    return std::move(Database::open(file())).value();
-  }
-
-  test::TemporaryFolder home;
-  Pool pool;
-};
+using test::AccessDatabaseTest;
 
 TEST_F(AccessDatabaseTest, AFreshFolderGetsTheFileWithBothTables) {
   open();
   const auto database = plain();
   for (const char* table : {"orvid_apps", "camera_control"}) {
     for (const char* column : {"ID", "bundle_id", "date_added", "whitelisted"}) {
-      EXPECT_TRUE(database->hasColumn(table, column)) << table << "." << column;
+      EXPECT_EQ(database->hasColumn(table, column), true) << table << "." << column;
     }
   }
   struct stat status {};
@@ -52,13 +35,19 @@ TEST_F(AccessDatabaseTest, AFreshFolderGetsTheFileWithBothTables) {
   EXPECT_EQ(status.st_mode & 0777, 0700u);
 }
 
-TEST_F(AccessDatabaseTest, AnOldFileWithoutTheColumnGainsIt) {
+TEST_F(AccessDatabaseTest, AnOldFileWithoutTheColumnGainsItAndKeepsItsGrants) {
   ASSERT_FALSE(plain()->execute(
       "CREATE TABLE camera_control (ID INTEGER PRIMARY KEY, bundle_id TEXT, date_added INTEGER)"));
+  ASSERT_FALSE(
+      plain()->execute("INSERT INTO camera_control(bundle_id,date_added) VALUES ('org.example.App',7)"));
   const test::StandardErrorCapture log;
-  open();
+  const auto database = open();
   EXPECT_THAT(log.text(), HasSubstr("'whitelisted' does not appear in camera_control, updating database"));
-  EXPECT_TRUE(plain()->hasColumn("camera_control", "whitelisted"));
+  EXPECT_EQ(plain()->hasColumn("camera_control", "whitelisted"), true);
+  EXPECT_THAT(database->bundleIdentifiersControllingExternalCameras(), ElementsAre("org.example.App"));
+  EXPECT_FALSE(database->rowsOf("org.example.App", Table::control)[0].contains("whitelisted"));
+  database->addControlApplicationWithBundleIdentifier("org.example.Other", true);
+  EXPECT_EQ(database->rowsOf("org.example.Other", Table::control)[0].boolean("whitelisted"), true);
 }
 
 TEST_F(AccessDatabaseTest, AddingTwiceLeavesTwoRowsAndOneRevokeRemovesBoth) {
@@ -110,14 +99,46 @@ TEST_F(AccessDatabaseTest, TheStatusOfAGrantCanBeChanged) {
   EXPECT_EQ(database->bundleIdentifiersAccessingExternalCamerasWithStatus()[0].boolean("whitelisted"), true);
 }
 
-TEST_F(AccessDatabaseTest, AnIdentifierWithQuotesIsDataAndNoStatement) {
+TEST_F(AccessDatabaseTest, AnIdentifierIsDataAndNeverAStatement) {
   const auto database = open();
-  const std::string hostile = "x'; DROP TABLE orvid_apps; --";
-  database->addApplicationWithBundleIdentifier(hostile, true);
-  database->addApplicationWithBundleIdentifier("' OR '1'='1", true);
-  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre(hostile, "' OR '1'='1"));
-  database->revokeApplicationWithBundleIdentifier("' OR '1'='1");
-  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre(hostile));
+  const std::vector<std::string> hostile{"x'; DROP TABLE orvid_apps; --",
+                                         "' OR '1'='1",
+                                         "\"; DELETE FROM orvid_apps; --",
+                                         "?1 :a @b $c %s %d {} {0}",
+                                         "two\nlines\r\n\x1B[2J",
+                                         std::string("org.orvid.Photos\0.evil", 22),
+                                         std::string("\0", 1),
+                                         "\xFF\xFE no UTF-8 \xC0\x80",
+                                         "",
+                                         std::string(1 << 20, 'x')};
+  for (const std::string& identifier : hostile) {
+    database->addApplicationWithBundleIdentifier(identifier, false);
+    database->addControlApplicationWithBundleIdentifier(identifier, true);
+  }
+  EXPECT_EQ(database->bundleIdentifiersAccessingExternalCameras(), hostile);
+  EXPECT_EQ(database->bundleIdentifiersControllingExternalCameras(), hostile);
+  std::vector<std::string> left = hostile;
+  for (const std::string& identifier : hostile) {
+    database->updateApplicationWithBundleIdentifier(identifier, true);
+    const auto rows = database->rowsOf(identifier, Table::access);
+    ASSERT_THAT(rows, SizeIs(1));
+    EXPECT_EQ(*rows[0].string("bundle_id"), identifier);
+    EXPECT_EQ(rows[0].boolean("whitelisted"), true);
+    database->revokeApplicationWithBundleIdentifier(identifier);
+    left.erase(left.begin());
+    EXPECT_EQ(database->bundleIdentifiersAccessingExternalCameras(), left);
+  }
+  EXPECT_EQ(database->bundleIdentifiersControllingExternalCameras(), hostile)
+      << "the other table is untouched";
+}
+
+TEST_F(AccessDatabaseTest, ALineOfTheLogIsOneLineWhateverTheIdentifier) {
+  const auto database = open();
+  const test::StandardErrorCapture log;
+  database->revokeApplicationWithBundleIdentifier("org.example\n<3>everything is fine\x1B[2J");
+  const std::string text = log.text();
+  EXPECT_EQ(std::ranges::count(text, '\n'), 1) << text;
+  EXPECT_EQ(text.find('\x1B'), std::string::npos);
 }
 
 TEST_F(AccessDatabaseTest, GrantsOutliveTheService) {
@@ -130,59 +151,6 @@ TEST_F(AccessDatabaseTest, TwoOpenDatabasesSeeEachOthersGrants) {
   const auto commandLine = open();
   commandLine->addApplicationWithBundleIdentifier("org.example.App", true);
   EXPECT_THAT(service->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
-}
-
-TEST_F(AccessDatabaseTest, AFolderThatCannotBeMadeIsLoggedAndNothingIsGranted) {
-  test::writeFile(folder(), "in the way");
-  const test::StandardErrorCapture log;
-  const auto database = open();
-  EXPECT_THAT(log.text(), HasSubstr("ovaccess ! Failed to open/create database"));
-  database->addApplicationWithBundleIdentifier("org.example.App", true);
-  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), IsEmpty());
-  EXPECT_EQ(test::readFile(folder()), "in the way");
-}
-
-TEST_F(AccessDatabaseTest, ACorruptFileIsLoggedAndNotDestroyed) {
-  const std::string garbage(10'000, 'x');
-  test::writeFile(file(), garbage);
-  const test::StandardErrorCapture log;
-  const auto database = open();
-  EXPECT_THAT(log.text(), HasSubstr("Failed to create table: orvid_apps - "));
-  EXPECT_THAT(log.text(), HasSubstr("Failed to create table: camera_control - "));
-  database->addApplicationWithBundleIdentifier("org.example.App", true);
-  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), IsEmpty());
-  EXPECT_EQ(test::readFile(file()), garbage);
-}
-
-TEST_F(AccessDatabaseTest, AReadOnlyFileStillGivesItsGrants) {
-  open()->addApplicationWithBundleIdentifier("org.example.App", true);
-  ASSERT_EQ(::chmod(file().c_str(), 0444), 0);
-  ASSERT_EQ(::chmod(folder().c_str(), 0555), 0);
-  const test::StandardErrorCapture log;
-  {
-    const auto database = open();
-    EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
-    if (::getuid() != 0) {  // root may write it all the same
-      database->addApplicationWithBundleIdentifier("org.example.Other", true);
-      EXPECT_THAT(log.text(), HasSubstr("readonly"));
-    }
-  }
-  ::chmod(folder().c_str(), 0755);
-}
-
-TEST_F(AccessDatabaseTest, ALockedFileIsWaitedFor) {
-  const auto database = open();
-  const auto other = plain();
-  ASSERT_FALSE(other->execute("BEGIN EXCLUSIVE"));
-  std::atomic<pid_t> adding = 0;
-  std::thread add([&] {
-    adding = ::gettid();
-    database->addApplicationWithBundleIdentifier("org.example.App", true);
-  });
-  EXPECT_TRUE(test::waitUntil([&] { return adding != 0 && test::isBlocked(adding); }));
-  EXPECT_FALSE(other->execute("COMMIT"));
-  add.join();
-  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
 }
 
 }  // namespace

@@ -16,8 +16,9 @@ struct sqlite3;
 
 namespace brivo {
 
-/// One SQLite database file. Another process that writes it is waited for, up to kBusyTime. *Thread-bound*:
-/// one thread at a time.
+/// One SQLite database file. Another process that writes it is waited for, up to kBusyTime. What a statement
+/// has changed is on the medium when it returns, and stays whatever becomes of the process or the power.
+/// Views and triggers in the file are not run. *Thread-bound*: one thread at a time.
 class Database {
  public:
   static constexpr int kBusyTime = 5000;  ///< milliseconds
@@ -38,14 +39,24 @@ class Database {
   [[nodiscard]] std::optional<std::string> execute(const std::string& statement,
                                                    std::initializer_list<Binding> bindings = {},
                                                    const RowHandler& onRow = nullptr);
-  bool hasColumn(const std::string& table, const std::string& column);
+  /// None when the file does not tell.
+  std::optional<bool> hasColumn(const std::string& table, const std::string& column);
+  /// True when the file was removed, or another was put in its place, since it was opened: statements still
+  /// go to the one that nobody else sees any more.
+  bool hasLostItsFile() const;
   /// The engine's message when the file cannot be closed; it is closed when this goes at the latest.
   [[nodiscard]] std::optional<std::string> close();
 
  private:
   explicit Database(sqlite3* handle) : handle_(handle) {}
 
+  /// Has the engine wait until the folder knows, too, that a change is complete.
+  void makeDurable();
+  std::optional<std::string> run(const std::string& statement, std::initializer_list<Binding> bindings,
+                                 const RowHandler& onRow);
+
   sqlite3* handle_;
+  bool durable_ = false;
 };
 
 }  // namespace brivo

@@ -3,6 +3,9 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sqlite3.h>
+
+#include <filesystem>
 
 #include "support/temporary_folder.h"
 
@@ -64,9 +67,75 @@ TEST_F(DatabaseTest, APathThatCannotBeOpenedIsAnError) {
 TEST_F(DatabaseTest, TellsWhetherAColumnIsThere) {
   const auto database = open();
   ASSERT_FALSE(database->execute("CREATE TABLE t (a)"));
-  EXPECT_TRUE(database->hasColumn("t", "a"));
-  EXPECT_FALSE(database->hasColumn("t", "b"));
-  EXPECT_FALSE(database->hasColumn("u", "a"));
+  EXPECT_EQ(database->hasColumn("t", "a"), true);
+  EXPECT_EQ(database->hasColumn("t", "b"), false);
+  EXPECT_EQ(database->hasColumn("u", "a"), false);
+}
+
+TEST_F(DatabaseTest, AFileThatIsNoDatabaseDoesNotTellWhetherAColumnIsThere) {
+  test::writeFile(folder / "test.db", std::string(5000, 'x'));
+  EXPECT_EQ(open()->hasColumn("t", "a"), std::nullopt);
+}
+
+TEST_F(DatabaseTest, ATextMayHaveZerosInIt) {
+  const auto database = open();
+  const std::string text("a\0b", 3);
+  ASSERT_FALSE(database->execute("CREATE TABLE t (name TEXT)"));
+  ASSERT_FALSE(database->execute("INSERT INTO t VALUES (?)", {text}));
+  std::vector<std::string> found;
+  ASSERT_FALSE(database->execute("SELECT name FROM t WHERE name IS ?", {text},
+                                 [&](const auto& row) { found.push_back(*row[0].second); }));
+  EXPECT_THAT(found, testing::ElementsAre(text));
+}
+
+TEST_F(DatabaseTest, AChangeIsOnTheMediumBeforeItIsReported) {
+  const auto database = open();
+  std::string level;
+  ASSERT_FALSE(database->execute("PRAGMA synchronous", {}, [&](const auto& row) { level = *row[0].second; }));
+  EXPECT_EQ(level, "3") << "EXTRA: the folder is waited for as well";
+}
+
+TEST_F(DatabaseTest, AChangeIsOnTheMediumAlsoWhenTheFileWasLockedAtFirst) {
+  const auto other = open();
+  ASSERT_FALSE(other->execute("CREATE TABLE t (a)"));
+  ASSERT_FALSE(other->execute("BEGIN EXCLUSIVE"));
+  const auto database = open();
+  EXPECT_TRUE(database->execute("SELECT a FROM t"));
+  ASSERT_FALSE(other->execute("COMMIT"));
+  std::string level;
+  ASSERT_FALSE(database->execute("PRAGMA synchronous", {}, [&](const auto& row) { level = *row[0].second; }));
+  EXPECT_EQ(level, "3");
+}
+
+TEST_F(DatabaseTest, TellsThatItsFileWasRemovedOrReplaced) {
+  const std::string file = folder / "test.db";
+  const auto database = open();
+  ASSERT_FALSE(database->execute("CREATE TABLE t (a)"));
+  EXPECT_FALSE(database->hasLostItsFile());
+  std::filesystem::rename(file, folder / "old.db");
+  EXPECT_TRUE(database->hasLostItsFile());
+  test::writeFile(file, "");
+  EXPECT_TRUE(database->hasLostItsFile());
+}
+
+TEST_F(DatabaseTest, TriggersAndViewsInTheFileAreNotRun) {
+  {
+    sqlite3* foreign = nullptr;
+    ASSERT_EQ(sqlite3_open((folder / "test.db").c_str(), &foreign), SQLITE_OK);
+    EXPECT_EQ(sqlite3_exec(foreign,
+                           "CREATE TABLE t (a); CREATE TABLE trace (a);"
+                           "CREATE TRIGGER copy AFTER INSERT ON t BEGIN INSERT INTO trace VALUES (1); END;"
+                           "CREATE VIEW everything AS SELECT a FROM t;",
+                           nullptr, nullptr, nullptr),
+              SQLITE_OK);
+    sqlite3_close(foreign);
+  }
+  const auto database = open();
+  ASSERT_FALSE(database->execute("INSERT INTO t VALUES (1)"));
+  int traces = 0;
+  ASSERT_FALSE(database->execute("SELECT a FROM trace", {}, [&](const auto&) { ++traces; }));
+  EXPECT_EQ(traces, 0);
+  EXPECT_THAT(database->execute("SELECT a FROM everything").value_or(""), HasSubstr("prohibited"));
 }
 
 TEST_F(DatabaseTest, TwoConnectionsSeeEachOthersWrites) {

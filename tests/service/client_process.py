@@ -33,6 +33,9 @@ class Client:
         except GLib.Error:
             return False
 
+    def device_count(self):
+        return len(self.manager.devices())
+
     def enumerate(self):
         self.device.enumerate()
 

@@ -75,6 +75,7 @@ class Service:
         self.environment = {name: value for name, value in self.environment.items() if value is not None}
         self.log_path = f"{self.folder}/log"
         self.address = f"unix:path={self.runtime}/manager"
+        self.command = [BRIVOD]
         self.process = None
         if grant:
             self.grant(PYTHON)
@@ -83,7 +84,7 @@ class Service:
 
     def start(self):
         with open(self.log_path, "ab") as log:
-            self.process = subprocess.Popen([BRIVOD], env=self.environment, stdin=subprocess.DEVNULL, stderr=log)
+            self.process = subprocess.Popen(self.command, env=self.environment, stdin=subprocess.DEVNULL, stderr=log)
         wait_until(lambda: self.process.poll() is not None or os.path.exists(f"{self.runtime}/manager"), "the socket")
         if self.process.poll() is not None:
             raise AssertionError("brivod ended at once:\n" + self.log())
@@ -403,20 +404,20 @@ class ServiceTest(unittest.TestCase):
         make_card(f"{self.service.volumes}/{name}", files, **options)
         return f"{self.service.volumes}/{name}"
 
-    def other_client(self):
+    def other_client(self, *command):
         """A client in a process of its own; see client_process.py."""
-        client = ClientProcess(self.service)
+        client = ClientProcess(self.service, *command)
         self.addCleanup(client.close)
         return client
 
 
 class ClientProcess:
     """A client that is another process, because a process may open a device once. It takes one line of JSON, a list
-    of method name and arguments, and answers with one."""
+    of method name and arguments, and answers with one. The command is what runs the script."""
 
-    def __init__(self, service, program=None):
+    def __init__(self, service, *command):
         script = os.path.join(os.path.dirname(__file__), "client_process.py")
-        self.process = subprocess.Popen([program or PYTHON, script, service.address], stdin=subprocess.PIPE,
+        self.process = subprocess.Popen([*(command or [PYTHON]), script, service.address], stdin=subprocess.PIPE,
                                         stdout=subprocess.PIPE, text=True, env={**os.environ, "BRIVOD_BUILD": BUILD})
 
     def ask(self, method, *arguments):

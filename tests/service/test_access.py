@@ -1,12 +1,14 @@
 # SPDX-License-Identifier: MIT
 """Who is let in, and what becomes of the service when the access database is not as it should be."""
+import concurrent.futures
+import contextlib
 import os
 import shutil
 import sqlite3
 import stat
 import subprocess
 
-from harness import PYTHON, ServiceTest, grants_in
+from harness import KORVEL, PATH, PYTHON, Gio, ServiceTest, connect_raw, grants_in
 
 
 class AccessTest(ServiceTest):
@@ -33,6 +35,31 @@ class RefusalTest(AccessTest):
         revoked = self.service.brivoctl("access", "revoke", PYTHON)
         self.assertEqual(revoked.returncode, 0, revoked.stderr)
         self.assertTrue(self.refused())
+
+    def test_a_refused_connection_is_closed_before_its_first_message_is_served(self):
+        manager = self.manager()
+        handle = manager.wait_for_device(self.path)["OVDeviceHandle"]
+        path = manager.open(handle)["OVDeviceEndpoint"].removeprefix("unix:path=")
+        call = Gio.DBusMessage.new_method_call(None, PATH, KORVEL, "requestStartUsingDeviceWithReply")
+        call.set_serial(1)
+        user = str(os.geteuid()).encode().hex().encode()
+        with connect_raw(path) as raw:
+            raw.sendall(b"\0AUTH EXTERNAL " + user + b"\r\nBEGIN\r\n"
+                        + call.to_blob(Gio.DBusCapabilityFlags.NONE))
+            received = b""
+            with contextlib.suppress(ConnectionResetError):
+                while part := raw.recv(4096):
+                    received += part
+        self.assertNotIn(b"OVDevice", received)
+        self.assertLess(len(received), 64, "no more than a greeting")
+        self.assertNotIn("BrivoDevice Properties", self.service.log(), "nothing was begun for it")
+
+    def test_two_programs_that_grant_at_once_both_do(self):
+        names = [f"org.example.App{i}" for i in range(12)]
+        with concurrent.futures.ThreadPoolExecutor(4) as threads:
+            results = list(threads.map(lambda name: self.service.brivoctl("access", "grant", name), names))
+        self.assertEqual([result.returncode for result in results], [0] * len(names), results)
+        self.assertEqual(sorted(grants_in(self.service.database)), sorted(names))
 
     def test_a_process_is_asked_about_once(self):
         client = self.other_client()
@@ -97,6 +124,36 @@ class DatabaseTest(AccessTest):
         self.assertIn("ovaccess", self.service.log())
         self.assertNotEqual(self.service.brivoctl("access", "grant", PYTHON).returncode, 0)
         self.assertEqual(len(self.manager().devices()), 1)
+
+    def test_a_corrupt_database_refuses_everybody_but_the_built_in_and_stays_as_it_is(self):
+        self.service.grant(PYTHON)
+        corrupt = b"SQLite format 3\x00" + b"\xff" * 8192
+        self.damage(lambda: self.put(corrupt))
+        self.assertTrue(self.refused())
+        listed = self.service.brivoctl("ls")
+        self.assertEqual((listed.returncode, b"IMG_0001.JPG" in listed.stdout), (0, True), listed.stderr)
+        self.assertIn("Failed to create table: orvid_apps - ", self.service.log())
+        with open(self.service.database, "rb") as file:
+            self.assertEqual(file.read(), corrupt)
+
+    def test_a_database_that_is_damaged_while_the_service_runs_refuses_and_stays_as_it_is(self):
+        self.service.grant(PYTHON)
+        self.assertFalse(self.refused())
+        damaged = os.path.getsize(self.service.database) * b"\xaa"
+        with open(self.service.database, "r+b") as file:
+            file.write(damaged)
+        self.assertTrue(self.refused())
+        self.assertIn("ovaccess ! file is not a database", self.service.log())
+        with open(self.service.database, "rb") as file:
+            self.assertEqual(file.read(), damaged)
+
+    def test_a_database_that_is_deleted_takes_its_grants_along_at_once(self):
+        self.service.grant(PYTHON)
+        self.assertFalse(self.refused())
+        shutil.rmtree(os.path.dirname(self.service.database))
+        self.assertTrue(self.refused())
+        self.service.grant(PYTHON)
+        self.assertFalse(self.refused())
 
     def test_a_database_that_is_another_file_grants_nothing(self):
         self.damage(lambda: self.put(b"this was no database " * 500))

@@ -13,7 +13,7 @@ std::optional<std::string> readSmallFile(int fd, std::size_t limit) {
   struct stat status {};
   if (::fstat(fd, &status) != 0 || !S_ISREG(status.st_mode)) return std::nullopt;
   std::string text;
-  std::array<char, 4096> part;
+  std::array<char, 4096> part{};
   for (;;) {
     const ssize_t size = ::read(fd, part.data(), part.size());
     if (size < 0 && errno == EINTR) continue;

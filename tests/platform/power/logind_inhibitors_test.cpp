@@ -5,8 +5,6 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/wait.h>
 #include <systemd/sd-bus.h>
 #include <unistd.h>
 
@@ -16,44 +14,15 @@
 
 #include "platform/base/unique_fd.h"
 #include "support/environment.h"
+#include "support/message_bus.h"
 #include "support/wait.h"
 
 namespace brivo {
 namespace {
 
 using namespace std::chrono_literals;
+using test::MessageBus;
 using test::waitUntil;
-
-/// dbus-daemon, ended with the test.
-class MessageBus {
- public:
-  MessageBus() {
-    int ends[2];
-    EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
-    pid_ = ::fork();
-    if (pid_ == 0) {
-      ::dup2(ends[1], 3);
-      ::execlp("dbus-daemon", "dbus-daemon", "--session", "--nofork", "--print-address=3", nullptr);
-      ::_exit(127);
-    }
-    const UniqueFd readEnd(ends[0]);
-    ::close(ends[1]);
-    char byte = 0;
-    while (::read(readEnd.get(), &byte, 1) == 1 && byte != '\n') address_ += byte;
-  }
-  ~MessageBus() {
-    ::kill(pid_, SIGTERM);
-    ::waitpid(pid_, nullptr, 0);
-  }
-  MessageBus(const MessageBus&) = delete;
-  MessageBus& operator=(const MessageBus&) = delete;
-
-  const std::string& address() const { return address_; }
-
- private:
-  pid_t pid_ = -1;
-  std::string address_;
-};
 
 /// Answers Inhibit with the write end of a pipe, and counts the locks that are held.
 class StandInLogind {

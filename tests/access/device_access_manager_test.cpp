@@ -6,7 +6,6 @@
 
 #include <set>
 
-#include "access/localized_string.h"
 #include "support/standard_error.h"
 #include "support/temporary_folder.h"
 
@@ -168,11 +167,6 @@ TEST_F(DeviceAccessManagerTest, AnAlertThatCannotBeShownIsNotCompleted) {
   bool completed = false;
   alone.displayAlertForApplication(app, alert, [&](bool, int) { completed = true; });
   EXPECT_FALSE(completed);
-}
-
-TEST(LocalizedStringTest, WithoutATranslationItIsTheKey) {
-  EXPECT_EQ(OVLocalizedString("A text that has no translation"), "A text that has no translation");
-  EXPECT_EQ(OVLocalizedString(""), "");
 }
 
 }  // namespace

@@ -42,7 +42,8 @@ expected() {
     "$libdir"/cmake/OrvidCore/OrvidCore{Config,ConfigVersion,Targets,Targets-CONFIG}.cmake \
     "$libdir"/libOrvidCore.so{,.0,".$version"} "$libdir/pkgconfig/orvidcore.pc" \
     libexec/brivod/brivod-imaging \
-    share/OrvidCore/DeviceMatchingInfo.plist share/applications/org.orvid.Photos.desktop
+    share/OrvidCore/DeviceMatchingInfo.plist share/applications/org.orvid.Photos.desktop \
+    share/locale/{de,ja}/LC_MESSAGES/OrvidCore.mo
 }
 check "exactly the files that belong there" diff <(expected | sort) <(installed | sort)
 

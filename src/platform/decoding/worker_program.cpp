@@ -3,9 +3,7 @@
 
 #include <unistd.h>
 
-#include <climits>
-
-#include "platform/base/paths.h"
+#include "platform/base/running_program.h"
 
 namespace brivo {
 
@@ -13,16 +11,10 @@ namespace {
 
 constexpr const char* kName = "/brivod-imaging";
 
-std::string runningProgram() {
-  char path[PATH_MAX];
-  const ssize_t size = ::readlink("/proc/self/exe", path, sizeof path);
-  return {path, size > 0 ? static_cast<std::size_t>(size) : 0};
-}
-
 }  // namespace
 
 std::string installedWorkerProgram() {
-  const std::string folder(parentPath(runningProgram()));
+  const std::string folder = runningProgramFolder();
   // An installed tree may have been moved.
   for (const std::string& path : {folder + kName, folder + BRIVOD_LIBEXEC_FROM_BIN_DIR + kName}) {
     if (::access(path.c_str(), X_OK) == 0) return path;

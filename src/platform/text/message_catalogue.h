@@ -5,9 +5,13 @@
 
 namespace brivo {
 
-/// The translation of `message` in a gettext domain whose catalogues this build installs; the message itself
-/// when there is none. The program must have called setlocale(3) to speak anything but English.
-/// *Thread-safe.*
+/// Makes localizedMessage() speak the language that the environment names (LANGUAGE, LC_ALL, LC_MESSAGES,
+/// LANG). LANGUAGE counts even when the system lacks the locale that the others name. Not while other threads
+/// run.
+void speakLanguageOfUser();
+
+/// The translation of `message` in a gettext domain whose catalogues are installed with the program; the
+/// message itself when there is none, and before speakLanguageOfUser(). *Thread-safe.*
 std::string localizedMessage(const char* domain, const std::string& message);
 
 }  // namespace brivo

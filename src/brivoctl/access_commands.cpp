@@ -1,111 +1,73 @@
 // SPDX-License-Identifier: MIT
-// access list|grant|revoke|whoami
+// access list|grant|revoke|ask|whoami
 #include <fmt/core.h>
 
-#include <algorithm>
 #include <memory>
 
-#include "access/access_database.h"
 #include "access/device_access_manager.h"
+#include "brivoctl/access_question.h"
 #include "brivoctl/command.h"
+#include "brivoctl/grants.h"
 #include "brivoctl/output.h"
 #include "platform/applications/desktop_catalogue.h"
-#include "platform/base/paths.h"
 #include "platform/identity/task_identity.h"
-#include "platform/settings/folders.h"
 #include "platform/settings/settings.h"
 
 namespace brivoctl {
 
 namespace {
 
-std::string identifierIn(const brivo::Dictionary& row) {
-  const std::string* identifier = row.string("bundle_id");
-  return identifier ? *identifier : std::string();
-}
-
-/// The access database of this user. A running service reads it for every new connection.
-class Grants {
- public:
-  Grants()
-      : folder_(brivo::appendingPathComponent(brivo::Settings::fromEnvironment().dataHome,
-                                              "org.orvid.imagecapture")),
-        database_(pool_, madeBelowBase(folder_)) {}
-
-  std::vector<brivo::Dictionary> rows() {
-    return database_.bundleIdentifiersAccessingExternalCamerasWithStatus();
-  }
-  bool isKnown(const std::string& identifier) {
-    return anyRow(identifier, [](const auto&) { return true; });
-  }
-  bool isGranted(const std::string& identifier) {
-    return anyRow(identifier, [](const auto& row) { return row.boolean("whitelisted").value_or(false); });
-  }
-  /// One confirmed grant, however many there were.
-  void grant(const std::string& identifier) {
-    if (isKnown(identifier)) {
-      database_.updateApplicationWithBundleIdentifier(identifier, true);
-    } else {
-      database_.addApplicationWithBundleIdentifier(identifier, true);
-    }
-  }
-  void revoke(const std::string& identifier) { database_.revokeApplicationWithBundleIdentifier(identifier); }
-  const std::string& folder() const { return folder_; }
-
- private:
-  template <class Test>
-  bool anyRow(const std::string& identifier, Test test) {
-    return std::ranges::any_of(
-        rows(), [&](const brivo::Dictionary& row) { return identifierIn(row) == identifier && test(row); });
-  }
-  static const std::string& madeBelowBase(const std::string& folder) {
-    (void)brivo::makeBaseDirectory(std::string(brivo::parentPath(folder)));  // or else nothing can be stored
-    return folder;
-  }
-
-  const std::string folder_;
-  brivo::Pool pool_;
-  brivo::AccessDatabase database_;
+/// What the subcommands are told.
+struct AccessOptions {
+  std::string identifier;
+  bool control = false;
 };
 
-ExitCode cannotStore(const Grants& grants) {
-  return fail("the access database in " + shown(grants.folder()) +
-              " cannot be written; BRIVOD_DEBUG=1 brivoctl says why");
+std::unique_ptr<Grants> grantsIn(AccessFile& file, bool control) {
+  if (control) return std::make_unique<ControlGrants>(file.database());
+  return std::make_unique<AccessGrants>(file.database());
 }
 
-ExitCode listGrants(const CommonOptions& common) {
-  Json list = Json::array();
-  Grants grants;
-  for (const auto& row : grants.rows()) {
-    list.push_back(
-        {{"identifier", identifierIn(row)}, {"granted", row.boolean("whitelisted").value_or(false)}});
-  }
+ExitCode listGrants(const CommonOptions& common, const AccessOptions& options) {
+  AccessFile file;
+  const auto grants = grantsIn(file, options.control)->list();
   if (common.json) {
+    Json list = Json::array();
+    for (const Grant& grant : grants) {
+      list.push_back({{"identifier", grant.identifier}, {"granted", grant.isGranted}});
+    }
     printJson(list);
     return kSuccess;
   }
-  for (const Json& row : list) {
-    printLine(fmt::format("{:<10}  {}", row["granted"].get<bool>() ? "granted" : "unconfirmed",
-                          shown(row["identifier"].get<std::string>())));
+  for (const Grant& grant : grants) {
+    printLine(
+        fmt::format("{:<10}  {}", grant.isGranted ? "granted" : "unconfirmed", shown(grant.identifier)));
   }
   return kSuccess;
 }
 
-ExitCode grant(const CommonOptions& common, const std::string& identifier) {
-  Grants grants;
-  grants.grant(identifier);
-  if (!grants.isGranted(identifier)) return cannotStore(grants);
-  if (common.json) printJson({{"identifier", identifier}, {"granted", true}});
+ExitCode grant(const CommonOptions& common, const AccessOptions& options) {
+  AccessFile file;
+  const auto grants = grantsIn(file, options.control);
+  grants->grant(options.identifier);
+  if (!grants->isGranted(options.identifier)) return cannotStore(file);
+  if (common.json) printJson({{"identifier", options.identifier}, {"granted", true}});
   return kSuccess;
 }
 
-ExitCode revoke(const CommonOptions& common, const std::string& identifier) {
-  Grants grants;
-  if (!grants.isKnown(identifier)) return fail(shown(identifier) + " has no grant");
-  grants.revoke(identifier);
-  if (grants.isKnown(identifier)) return cannotStore(grants);
-  if (common.json) printJson({{"identifier", identifier}, {"granted", false}});
+ExitCode revoke(const CommonOptions& common, const AccessOptions& options) {
+  AccessFile file;
+  const auto grants = grantsIn(file, options.control);
+  if (!grants->isKnown(options.identifier)) return fail(shown(options.identifier) + " has no grant");
+  grants->revoke(options.identifier);
+  if (grants->isKnown(options.identifier)) return cannotStore(file);
+  if (common.json) printJson({{"identifier", options.identifier}, {"granted", false}});
   return kSuccess;
+}
+
+ExitCode ask(const CommonOptions& common, const AccessOptions& options) {
+  return options.control ? askForControl(common, options.identifier)
+                         : askForAccess(common, options.identifier);
 }
 
 ExitCode whoAmI(const CommonOptions& common) {
@@ -125,6 +87,48 @@ ExitCode whoAmI(const CommonOptions& common) {
   return kSuccess;
 }
 
+/// Adds the subcommands one by one.
+class AccessCommands {
+ public:
+  using Command = ExitCode (*)(const CommonOptions&, const AccessOptions&);
+
+  AccessCommands(CLI::App& access, CommonOptions& common, ExitCode& exitCode)
+      : access_(access), common_(common), exitCode_(exitCode) {}
+
+  CLI::App* add(const char* name, const char* text) {
+    CLI::App* command = access_.add_subcommand(name, text);
+    command->add_flag("--json", common_.json, "Print JSON");
+    return command;
+  }
+
+  /// For grants of both kinds.
+  CLI::App* addForGrants(const char* name, const char* text, Command run) {
+    CLI::App* command = add(name, text);
+    command->add_flag("--control", options_->control, "To control cameras, instead of using them");
+    command->callback([&common = common_, &exitCode = exitCode_, options = options_, run] {
+      exitCode = run(common, *options);
+    });
+    return command;
+  }
+
+  /// For grants of one application.
+  void addForOne(const char* name, const char* text, Command run) {
+    const auto notEmpty = [](const std::string& value) {
+      return value.empty() ? std::string("An application has a name") : std::string();
+    };
+    addForGrants(name, text, run)
+        ->add_option("IDENTIFIER", options_->identifier, "Which application")
+        ->required()
+        ->check(notEmpty);
+  }
+
+ private:
+  CLI::App& access_;
+  CommonOptions& common_;
+  ExitCode& exitCode_;
+  const std::shared_ptr<AccessOptions> options_ = std::make_shared<AccessOptions>();
+};
+
 }  // namespace
 
 void addAccessCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode) {
@@ -132,24 +136,16 @@ void addAccessCommands(CLI::App& app, CommonOptions& common, ExitCode& exitCode)
   access->require_subcommand(1);
   access->footer(
       "An application is known by its Flatpak or snap name, by its desktop file, or by the absolute path of "
-      "its "
-      "program. Grants count from the application's next start on.");
-  const auto add = [&](const char* name, const char* text) {
-    CLI::App* command = access->add_subcommand(name, text);
-    command->add_flag("--json", common.json, "Print JSON");
-    return command;
-  };
-  add("list", "List the grants")->callback([&] { exitCode = listGrants(common); });
-  add("whoami", "Print the identifier that this program is known by")->callback([&] {
-    exitCode = whoAmI(common);
-  });
-  const auto identifier = std::make_shared<std::string>();
-  CLI::App* granting = add("grant", "Let an application use the cameras");
-  granting->add_option("IDENTIFIER", *identifier, "Which application")->required();
-  granting->callback([&common, &exitCode, identifier] { exitCode = grant(common, *identifier); });
-  CLI::App* revoking = add("revoke", "Take an application's grants back");
-  revoking->add_option("IDENTIFIER", *identifier, "Which application")->required();
-  revoking->callback([&common, &exitCode, identifier] { exitCode = revoke(common, *identifier); });
+      "its program. Grants count from the application's next start on.\n"
+      "\"ask\" shows a notification with buttons and waits for the answer; it ends with 0 when the "
+      "application may, with 4 when it may not, and with 1 when nobody can be asked.");
+  AccessCommands commands(*access, common, exitCode);
+  commands.addForGrants("list", "List the grants", listGrants);
+  commands.addForOne("grant", "Let an application use the cameras", grant);
+  commands.addForOne("revoke", "Take an application's grants back", revoke);
+  commands.addForOne("ask", "Ask the user on the screen to let an application use the cameras", ask);
+  commands.add("whoami", "Print the identifier that this program is known by")
+      ->callback([&common, &exitCode] { exitCode = whoAmI(common); });
 }
 
 }  // namespace brivoctl

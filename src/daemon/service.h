@@ -52,7 +52,7 @@ class Service {
   WorkerMovieReader movieReader_{workers_};
   MovieService movies_;
   AccessDatabase database_;
-  OVDeviceAccessManager access_{database_, applications_, nullptr};
+  OVDeviceAccessManager access_{database_, applications_, nullptr};  // without alerts: devices never ask
   Transactions transactions_;
   zeph::ConnectionService connections_;
   VolumeMonitor volumes_;

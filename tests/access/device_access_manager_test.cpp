@@ -4,10 +4,16 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <set>
+#include <unistd.h>
 
+#include <atomic>
+#include <set>
+#include <thread>
+
+#include "support/processes.h"
 #include "support/standard_error.h"
 #include "support/temporary_folder.h"
+#include "support/wait.h"
 
 namespace brivo {
 namespace {
@@ -162,11 +168,51 @@ TEST_F(DeviceAccessManagerTest, ControlIsGivenWithoutAnAlert) {
   EXPECT_THAT(database.bundleIdentifiersControllingExternalCameras(), ElementsAre(app));
 }
 
+TEST_F(DeviceAccessManagerTest, TheCompletionHearsWhichButtonWasPressed) {
+  for (const auto response :
+       {UserAlert::defaultButton, UserAlert::alternateButton, UserAlert::otherButton, UserAlert::dismissed}) {
+    alerts.response = response;
+    std::vector<std::pair<bool, int>> heard;
+    manager.displayAlertForApplication(app, alert,
+                                       [&](bool handled, int code) { heard.emplace_back(handled, code); });
+    EXPECT_THAT(heard, ElementsAre(std::pair(true, static_cast<int>(response))));
+  }
+}
+
 TEST_F(DeviceAccessManagerTest, AnAlertThatCannotBeShownIsNotCompleted) {
   OVDeviceAccessManager alone(database, applications, nullptr);
   bool completed = false;
   alone.displayAlertForApplication(app, alert, [&](bool, int) { completed = true; });
   EXPECT_FALSE(completed);
+}
+
+/// What a thread needs that outlives its test.
+struct Stuck {
+  explicit Stuck(const std::string& folder) : database(pool, folder) {}
+
+  Pool pool;
+  AccessDatabase database;
+  Applications applications;
+  OVDeviceAccessManager manager{database, applications, nullptr};
+  const Dictionary alert{{"title", "May it?"}};
+  std::atomic<pid_t> asking = 0;
+  std::atomic<bool> answered = false;
+};
+
+TEST(UnansweredTest, WhoAsksWhereNobodyCanBeAskedKeepsWaiting) {
+  const test::TemporaryFolder home;
+  const test::StandardErrorCapture log;
+  auto* stuck = new Stuck(home / "data");  // for as long as the process lives, as is its thread
+  std::thread([stuck] {
+    stuck->asking = ::gettid();
+    (void)stuck->manager.validateBundleIdentifier("org.example.App", &stuck->alert);
+    stuck->answered = true;
+  }).detach();
+  EXPECT_TRUE(test::waitUntil(
+      [&] { return log.text().find("nobody can be asked about org.example.App") != std::string::npos; }));
+  EXPECT_TRUE(test::waitUntil([&] { return test::isBlocked(stuck->asking); }));
+  EXPECT_FALSE(stuck->answered);
+  EXPECT_THAT(stuck->database.bundleIdentifiersAccessingExternalCameras(), IsEmpty());
 }
 
 }  // namespace

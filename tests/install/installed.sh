@@ -35,6 +35,11 @@ packages=(brivod brivoctl liborvidcore0 liborvidcore-dev)
 check "dpkg installs the packages" inside sh -c 'dpkg --install /tmp/packages/*.deb'
 check "their files are as they were packed" diff <(:) <(inside dpkg --verify "${packages[@]}")
 check "the linker finds the library" grep -q libOrvidCore.so.0 <(inside ldconfig -p)
+wanted=$root/etc/systemd/user/sockets.target.wants/brivod.socket
+if [ -e "$source/packaging/systemd/brivod.socket" ]; then
+  check "every session listens for clients of the service" \
+    [ "$(readlink "$wanted")" = /usr/lib/systemd/user/brivod.socket ]
+fi
 [ "$failed" = 0 ] || exit 1
 
 chroot "$root" setpriv --reuid=65534 --regid=65534 --clear-groups \

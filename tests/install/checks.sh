@@ -1,5 +1,7 @@
 # SPDX-License-Identifier: MIT
+# shellcheck shell=bash disable=SC2034
 # Sourced by the scripts beside it: a folder to work in, and checks that are counted.
+export LC_ALL=C.UTF-8  # lists are compared in one order
 work=$(realpath "$(mktemp -d /tmp/brivod-install.XXXXXX)")  # short: the path of a unix socket has 107 bytes
 failed=0
 

@@ -38,7 +38,7 @@ _brivoctl_argument() {
   case "$*" in
     "" | access) _brivoctl_offer < <(_brivoctl_subcommands "$program" "$@") ;;
     ls | info | read | rm | thumb | sheet | get | import) _brivoctl_device ;;
-    "access grant") _brivoctl_files -f ;;
+    "access grant" | "access ask") _brivoctl_files -f ;;
     "access revoke") _brivoctl_offer < <(_brivoctl_values identifier "$program" access list) ;;
     dataset) _brivoctl_files -f ;;
   esac

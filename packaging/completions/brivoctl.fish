@@ -48,6 +48,6 @@ complete -c brivoctl -n 'not __brivoctl_in_value; and __brivoctl_at "" access' -
 complete -c brivoctl -n 'not __brivoctl_in_value; and string match -q -- "-*" (commandline -ct)' -a '(__brivoctl_options)'
 complete -c brivoctl -n 'not __brivoctl_in_value; and __brivoctl_at ls info read rm thumb sheet get import' -a '(__brivoctl_devices)'
 complete -c brivoctl -n 'not __brivoctl_in_value; and __brivoctl_at "access revoke"' -a '(__brivoctl_identifiers)'
-complete -c brivoctl -n 'not __brivoctl_in_value; and __brivoctl_at dataset "access grant"' -F
+complete -c brivoctl -n 'not __brivoctl_in_value; and __brivoctl_at dataset "access grant" "access ask"' -F
 complete -c brivoctl -n 'contains -- (commandline -opc)[-1] -o --output --receipt' -F
 complete -c brivoctl -n 'contains -- (commandline -opc)[-1] -d --directory' -a '(__fish_complete_directories)'

@@ -41,19 +41,36 @@ bool isAscii(std::string_view text) {
 
 bool isControl(char32_t c) { return c < 0x20 || (c >= 0x7F && c < 0xA0) || c == 0x2028 || c == 0x2029; }
 
+bool isNoncharacter(char32_t c) { return (c >= 0xFDD0 && c <= 0xFDEF) || (c & 0xFFFE) == 0xFFFE; }
+
+/// None is before U+FDD0, whose first byte is this.
+bool mayHoldNoncharacter(std::string_view utf8) {
+  return std::ranges::any_of(utf8, [](char c) { return static_cast<unsigned char>(c) >= 0xEF; });
+}
+
+template <class IsGood>
+std::string replacingAllBut(std::string_view bytes, IsGood isGood) {
+  std::string text;
+  for (std::size_t i = 0; i < bytes.size();) {
+    const CodePoint next = codePointAt(bytes, i);
+    text += next.value && isGood(*next.value) ? bytes.substr(i, next.length) : kReplacement;
+    i += next.length;
+  }
+  return text;
+}
+
 }  // namespace
 
 bool isUtf8(std::string_view text) { return u8_check(units(text), text.size()) == nullptr; }
 
 std::string replacingInvalidUtf8(std::string_view bytes) {
   if (isUtf8(bytes)) return std::string(bytes);
-  std::string text;
-  for (std::size_t i = 0; i < bytes.size();) {
-    const CodePoint next = codePointAt(bytes, i);
-    text += next.value ? bytes.substr(i, next.length) : kReplacement;
-    i += next.length;
-  }
-  return text;
+  return replacingAllBut(bytes, [](char32_t) { return true; });
+}
+
+std::string replacingNoncharacters(std::string_view bytes) {
+  if (isUtf8(bytes) && !mayHoldNoncharacter(bytes)) return std::string(bytes);
+  return replacingAllBut(bytes, [](char32_t c) { return !isNoncharacter(c); });
 }
 
 std::u16string toUtf16(std::string_view utf8) {

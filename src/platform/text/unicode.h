@@ -14,6 +14,10 @@ bool isUtf8(std::string_view text);
 /// `bytes` with every ill-formed sequence replaced by U+FFFD, and so always UTF-8.
 std::string replacingInvalidUtf8(std::string_view bytes);
 
+/// The same, with U+FFFD for each noncharacter too (Unicode Standard, section 23.7): sd-bus refuses messages
+/// that hold one.
+std::string replacingNoncharacters(std::string_view bytes);
+
 /// UTF-8 to UTF-16 code units in native order; ill-formed sequences become U+FFFD.
 std::u16string toUtf16(std::string_view utf8);
 

@@ -16,10 +16,9 @@
 
 namespace brivo::zeph {
 
-/// Text that D-Bus takes: UTF-8 without NUL characters.
+/// Text that every D-Bus library takes: UTF-8 without NUL characters and noncharacters.
 inline std::string wireText(const std::string& text) {
-  if (isUtf8(text) && text.find('\0') == std::string::npos) return text;
-  std::string safe = replacingInvalidUtf8(text);
+  std::string safe = replacingNoncharacters(text);
   std::erase(safe, '\0');
   return safe;
 }

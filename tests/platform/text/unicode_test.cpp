@@ -15,6 +15,13 @@ TEST(UnicodeTest, TellsUtf8FromOtherBytes) {
   EXPECT_FALSE(isUtf8("\xE2\x82")) << "cut off";
 }
 
+TEST(UnicodeTest, NoncharactersBecomeReplacementCharacters) {
+  EXPECT_EQ(replacingNoncharacters("a\uFDD0\uFDEF\uFFFE\uFFFF\U0001FFFE\U0010FFFF"),
+            "a\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD");
+  EXPECT_EQ(replacingNoncharacters("\uFDCF\uFDF0\uFFFD\U00010000"), "\uFDCF\uFDF0\uFFFD\U00010000");
+  EXPECT_EQ(replacingNoncharacters("a\xFF"), "a\uFFFD");
+}
+
 TEST(UnicodeTest, InvalidBytesBecomeReplacementCharacters) {
   EXPECT_EQ(replacingInvalidUtf8("a\xFF\xC3\xA4"), "a\xEF\xBF\xBD\xC3\xA4");
   EXPECT_TRUE(isUtf8(replacingInvalidUtf8("\xE2\x82\xF0\x9F")));

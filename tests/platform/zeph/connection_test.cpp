@@ -107,6 +107,13 @@ TEST_F(EchoTest, TextThatIsNoUtf8IsMendedAndNotRefused) {
             "b");
 }
 
+TEST_F(EchoTest, NoncharactersAreMendedAndNotRefused) {
+  const auto client = connectClient();
+  const Answer answer = echo(client, {{"text", "a\uFFFEb\uFDD0c\U0010FFFFd\uFFFC"}});
+  ASSERT_TRUE(answer.ok());
+  EXPECT_EQ(*answer->front().get<Dictionary>()->string("text"), "a\uFFFDb\uFFFDc\uFFFDd\uFFFC");
+}
+
 TEST_F(EchoTest, ACallThatIsOnlyDeclaredIsAnsweredAsUnknown) {
   const auto client = connectClient();
   const Answer answer = call(client, "only:declared:withReply:", {});

@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <cstring>
 #include <utility>
 
 #include "platform/zeph/send_burst.h"
@@ -159,8 +160,14 @@ Reply BusConnection::replyFor(std::uint64_t token) {
 
 void BusConnection::start() {
   if (ended_ || link_ || !exported_ || !remote_) return;
-  link_ = BusLink::open(loop_.event(), std::move(socket_), role_, takesBuffers_, *exported_, *remote_, *this);
-  if (!link_) return end(End::interrupted, "cannot be served: no memory");
+  auto link =
+      BusLink::open(loop_.event(), std::move(socket_), role_, takesBuffers_, *exported_, *remote_, *this);
+  if (!link.ok()) {
+    const bool hungUp = BusLink::isHangUp(link.error());
+    return end(End::interrupted,
+               hungUp ? "" : fmt::format("cannot be served: {}", std::strerror(-link.error())));
+  }
+  link_ = std::move(*link);
   link_->flush();
 }
 

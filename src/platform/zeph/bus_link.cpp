@@ -10,6 +10,7 @@
 #include <limits>
 
 #include "platform/zeph/bus_driver.h"
+#include "platform/zeph/bus_message.h"
 #include "platform/zeph/bus_vtable.h"
 #include "platform/zeph/pass_rights.h"
 #include "platform/zeph/value_codec.h"
@@ -48,10 +49,12 @@ struct BusLink::PendingCall {
   sd_bus_slot* slot = nullptr;
 };
 
-std::unique_ptr<BusLink> BusLink::open(sd_event* event, UniqueFd socket, Role role, bool takesBuffers,
-                                       const Interface& exported, const Interface& remote, LinkOwner& owner) {
+Result<std::unique_ptr<BusLink>, int> BusLink::open(sd_event* event, UniqueFd socket, Role role,
+                                                    bool takesBuffers, const Interface& exported,
+                                                    const Interface& remote, LinkOwner& owner) {
   std::unique_ptr<BusLink> link(new BusLink(event, role, takesBuffers, exported, remote, owner));
-  if (link->start(std::move(socket)) < 0) return nullptr;
+  const int result = link->start(std::move(socket));
+  if (result < 0) return result;
   return link;
 }
 
@@ -160,8 +163,7 @@ void BusLink::turn() {
     result = sd_bus_process(bus_, nullptr);
   }
   if (result < 0) {
-    const bool hungUp = result == -ECONNRESET || result == -ENOTCONN || result == -EPIPE;
-    return end(hungUp ? "" : errorText(result));
+    return end(isHangUp(result) ? "" : errorText(result));
   }
   if (result > 0 && reading_) sd_event_source_set_enabled(again_, SD_EVENT_ONESHOT);
   refill();
@@ -229,7 +231,7 @@ void BusLink::refill() {
     const int result = std::visit([&](auto& message) { return put(message); }, next.message);
     weightsInBus_.push_back(next.weight);
     settleSent();
-    if (result == -ECONNRESET || result == -ENOTCONN || result == -EPIPE) return end("");
+    if (isHangUp(result)) return end("");
   }
   if (writeBatch()) sd_event_source_set_enabled(again_, SD_EVENT_ONESHOT);  // others first
 }
@@ -287,30 +289,12 @@ void BusLink::rearm() {
 
 // --------------------------------------------------------------------------------------------------- sending
 
-namespace {
-
-/// Owns one reference to a message.
-class Message {
- public:
-  ~Message() { sd_bus_message_unref(message_); }
-  sd_bus_message** out() { return &message_; }
-  sd_bus_message* get() const { return message_; }
-  Message() = default;
-  Message(const Message&) = delete;
-  Message& operator=(const Message&) = delete;
-
- private:
-  sd_bus_message* message_ = nullptr;
-};
-
-}  // namespace
-
 bool BusLink::peerTakesDescriptors() const {
   return role_ == Role::service && sd_bus_can_send(bus_, SD_BUS_TYPE_UNIX_FD) > 0;
 }
 
 int BusLink::put(const OutgoingSignal& signal) {
-  Message message;
+  BusMessage message;
   int result = sd_bus_message_new_signal(bus_, message.out(), kObjectPath, remote_.protocol().interface,
                                          signal.member->dbusName().c_str());
   if (result >= 0) {
@@ -326,7 +310,7 @@ int BusLink::put(OutgoingAnswer& answer) {
   callsToAnswer_.erase(found);
   int result = 0;
   if (answer.answer.ok()) {
-    Message message;
+    BusMessage message;
     result = sd_bus_message_new_method_return(call, message.out());
     if (result >= 0) {
       result = appendArguments(message.get(), member->out, answer.answer.value(), peerTakesDescriptors());
@@ -345,7 +329,7 @@ int BusLink::put(OutgoingAnswer& answer) {
 }
 
 int BusLink::put(OutgoingCall& call) {
-  Message message;
+  BusMessage message;
   int result = sd_bus_message_new_method_call(bus_, message.out(), nullptr, kObjectPath,
                                               remote_.protocol().interface, call.member->dbusName().c_str());
   if (result >= 0) {

@@ -5,6 +5,7 @@
 #include <systemd/sd-bus.h>
 #include <systemd/sd-event.h>
 
+#include <cerrno>
 #include <cstdint>
 #include <deque>
 #include <map>
@@ -12,6 +13,7 @@
 #include <string>
 #include <vector>
 
+#include "platform/base/result.h"
 #include "platform/base/unique_fd.h"
 #include "platform/zeph/outgoing.h"
 #include "platform/zeph/protocol.h"
@@ -42,12 +44,18 @@ class LinkOwner {
 /// *Thread-bound* to the I/O thread.
 class BusLink {
  public:
+  /// Whether an error of sd-bus is that the peer has gone.
+  static bool isHangUp(int result) {
+    return result == -ECONNRESET || result == -ENOTCONN || result == -EPIPE;
+  }
+
   enum class Role { service, client };
 
   /// Takes over the connected socket. The peer of a service may send descriptors when it `takesBuffers`.
-  /// Null, with the socket closed, when there is not enough memory.
-  static std::unique_ptr<BusLink> open(sd_event* event, UniqueFd socket, Role role, bool takesBuffers,
-                                       const Interface& exported, const Interface& remote, LinkOwner& owner);
+  /// A negative errno, with the socket closed, when the peer has hung up or there is not enough memory.
+  static Result<std::unique_ptr<BusLink>, int> open(sd_event* event, UniqueFd socket, Role role,
+                                                    bool takesBuffers, const Interface& exported,
+                                                    const Interface& remote, LinkOwner& owner);
   ~BusLink();
   BusLink(const BusLink&) = delete;
   BusLink& operator=(const BusLink&) = delete;

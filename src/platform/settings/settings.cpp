@@ -74,6 +74,7 @@ Settings Settings::fromEnvironment() {
   settings.volumeRoots = pathList(roots ? roots : "/media:/run/media:/mnt");
   settings.volumeFolders = pathList(variable("BRIVOD_VOLUME_FOLDERS"));
   settings.idleTime = seconds(variable("BRIVOD_IDLE_SECONDS"));
+  settings.startedByBus = !variable("DBUS_STARTER_ADDRESS").empty();
   return settings;
 }
 

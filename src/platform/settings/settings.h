@@ -29,6 +29,9 @@ struct Settings {
   /// $BRIVOD_IDLE_SECONDS, none when unset or no number.
   std::optional<std::chrono::seconds> idleTime;
 
+  /// True when a message bus started the process for somebody who calls it ($DBUS_STARTER_ADDRESS).
+  bool startedByBus = false;
+
   static Settings fromEnvironment();
 
   /// The first existing `relativePath` below the data directories or the installed one; empty when

@@ -28,13 +28,16 @@ bool mayConnect(const AuditToken& peer) {
   return own == 0 || peer.userIdentifier() == own || peer.userIdentifier() == 0;
 }
 
+/// Where nobody looks for it.
+std::string hiddenName(const std::string& path) { return path + "~"; }
+
 }  // namespace
 
 Result<UniqueFd> BusListener::bind(const std::string& path) {
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
   // Under its own name it appears when it listens: whoever sees it can connect.
-  const std::string before = path + "~";
+  const std::string before = hiddenName(path);
   if (before.size() >= sizeof address.sun_path) return SystemError{"socket path too long: " + path};
   std::memcpy(address.sun_path, before.c_str(), before.size() + 1);
   UniqueFd socket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
@@ -91,10 +94,24 @@ void BusListener::invalidate() {
   }
   if (ownsFile_) ::unlink(path_.c_str());
   loop_.post([self = shared_from_this()] {
+    if (self->isHidden_) ::unlink(hiddenName(self->path_).c_str());
     self->source_ = sd_event_source_disable_unref(self->source_);
     self->socket_.reset();
     self->listening_.reset();
   });
+}
+
+void BusListener::stopAccepting() {
+  if (ownsFile_ && source_ && ::rename(path_.c_str(), hiddenName(path_).c_str()) == 0) {
+    isHidden_ = true;
+    accept();
+  }
+  setAccepting(false);
+}
+
+void BusListener::goOnAccepting() {
+  if (std::exchange(isHidden_, false)) ::rename(hiddenName(path_).c_str(), path_.c_str());
+  setAccepting(true);
 }
 
 void BusListener::setAccepting(bool accepting) {
@@ -125,11 +142,26 @@ void BusListener::take(UniqueFd socket) {
                             peer.userIdentifier()));
     return;
   }
+  letDecide(std::move(socket), peer);
+}
+
+Result<std::weak_ptr<Connection>, CallError> BusListener::admit(UniqueFd socket, const AuditToken& peer) {
+  if (!source_) return CallError{kErrorFailed, "Nobody listens any more"};
+  if (!mayConnect(peer)) return CallError{kErrorAccessDenied, "Another user's clients are not served"};
+  if (undecided_ >= kMostUndecided)
+    return CallError{kErrorLimitsExceeded, "Too many clients connect at once"};
+  refuseDescriptors(socket);
+  return std::weak_ptr<Connection>(letDecide(std::move(socket), peer));
+}
+
+std::shared_ptr<Connection> BusListener::letDecide(UniqueFd socket, const AuditToken& peer) {
   ++undecided_;
-  queue_->post([self = shared_from_this(), connection = host_.adopt(std::move(socket), peer)] {
+  auto connection = host_.adopt(std::move(socket), peer);
+  queue_->post([self = shared_from_this(), connection] {
     if (!self->decide(connection)) connection->invalidate();
     self->loop_.post([self] { self->decided(); });
   });
+  return connection;
 }
 
 bool BusListener::decide(const std::shared_ptr<Connection>& connection) {

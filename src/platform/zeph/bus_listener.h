@@ -48,16 +48,20 @@ class BusListener final : public Listener, public std::enable_shared_from_this<B
   void setDelegate(std::weak_ptr<ListenerDelegate> delegate) override BRIVO_EXCLUDES(mutex_);
   void resume() override;
   void invalidate() override;
+  Result<std::weak_ptr<Connection>, CallError> admit(UniqueFd socket, const AuditToken& peer) override;
 
   // I/O thread.
-  /// Stops or goes on accepting; what connects meanwhile waits.
-  void setAccepting(bool accepting);
-  std::size_t undecided() const { return undecided_; }
+  /// Accepts who has connected to its own socket file, which nobody finds from here on, and then nobody more.
+  /// Who connects to the socket of a launch service waits there.
+  void stopAccepting();
+  void goOnAccepting();
 
  private:
   // I/O thread.
+  void setAccepting(bool accepting);
   void accept();
   void take(UniqueFd socket);
+  std::shared_ptr<Connection> letDecide(UniqueFd socket, const AuditToken& peer);
   void decided();
 
   bool decide(const std::shared_ptr<Connection>& connection) BRIVO_EXCLUDES(mutex_);
@@ -77,6 +81,7 @@ class BusListener final : public Listener, public std::enable_shared_from_this<B
   UniqueFd socket_;
   std::shared_ptr<BusListener> listening_;  // this, from resume() to invalidate()
   sd_event_source* source_ = nullptr;
+  bool isHidden_ = false;
   std::size_t undecided_ = 0;
 };
 

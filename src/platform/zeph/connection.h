@@ -7,6 +7,7 @@
 // one of the two end handlers runs, once, on that queue.
 #pragma once
 
+#include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <functional>
@@ -37,27 +38,48 @@ using Answer = Result<Arguments, CallError>;
 using AnswerHandler = std::function<void(Answer)>;
 using ErrorHandler = std::function<void(const CallError&)>;
 
+inline constexpr const char* kErrorAccessDenied = "org.freedesktop.DBus.Error.AccessDenied";
 inline constexpr const char* kErrorFailed = "org.freedesktop.DBus.Error.Failed";
 inline constexpr const char* kErrorDisconnected = "org.freedesktop.DBus.Error.Disconnected";
 inline constexpr const char* kErrorInvalidArgs = "org.freedesktop.DBus.Error.InvalidArgs";
+inline constexpr const char* kErrorLimitsExceeded = "org.freedesktop.DBus.Error.LimitsExceeded";
 inline constexpr const char* kErrorNoReply = "org.freedesktop.DBus.Error.NoReply";
+inline constexpr const char* kErrorNotSupported = "org.freedesktop.DBus.Error.NotSupported";
 inline constexpr const char* kErrorUnknownMethod = "org.freedesktop.DBus.Error.UnknownMethod";
 
-/// The one answer of a call. Copies stand for the same answer; the first one given counts. When the
-/// last copy goes without an answer, the caller gets an error instead of waiting for ever.
-/// *Thread-safe.*
-class Reply {
+/// The one answer of a call: values, or an error by name. Copies stand for the same answer; the first one
+/// given counts. When the last copy goes without an answer, the caller gets an error instead of waiting for
+/// ever. *Thread-safe.*
+template <class Values>
+class ReplyOf {
  public:
-  /// `sink` is called once, on the thread that answers.
-  explicit Reply(AnswerHandler sink);
+  using Sink = std::function<void(Result<Values, CallError>)>;
 
-  void operator()(Arguments values) const;
-  void fail(CallError error) const;
+  /// `sink` is called once, on the thread that answers.
+  explicit ReplyOf(Sink sink) : state_(std::make_shared<State>(std::move(sink))) {}
+
+  void operator()(Values values) const { state_->answer(std::move(values)); }
+  void fail(CallError error) const { state_->answer(std::move(error)); }
 
  private:
-  struct State;
+  struct State {
+    explicit State(Sink handler) : sink(std::move(handler)) {}
+    ~State() { answer(CallError{kErrorNoReply, "The request was dropped"}); }
+    State(const State&) = delete;
+    State& operator=(const State&) = delete;
+
+    void answer(Result<Values, CallError> given) {
+      if (!answered.exchange(true)) sink(std::move(given));
+    }
+
+    Sink sink;
+    std::atomic<bool> answered = false;
+  };
+
   std::shared_ptr<State> state_;
 };
+
+using Reply = ReplyOf<Arguments>;
 
 /// A call of the peer on the exported object.
 struct Invocation {

@@ -58,6 +58,7 @@ ConnectionService::~ConnectionService() {
       if (const auto listener = weak.lock()) listener->invalidate();
     }
     for (const auto& connection : connections_) connection->invalidate();
+    if (door_) door_->end();
     loop_.post([this] { loop_.quit(); });  // after what ending them posts
   });
   thread_.join();
@@ -121,18 +122,41 @@ Result<std::shared_ptr<Connection>> ConnectionService::connect(const Endpoint& e
   return std::shared_ptr<Connection>(std::move(connection));
 }
 
+void ConnectionService::openDoor(DoorPlan plan) {
+  loop_.post([this, plan = std::move(plan)] {
+    door_ = std::make_shared<BusDoor>(loop_, plan);
+    door_->open();
+  });
+}
+
 void ConnectionService::stopAcceptingIfIdle(std::function<void(bool idle)> answer) {
   loop_.post([this, answer = std::move(answer)] {
-    const auto setAccepting = [this](bool accepting) {
-      for (const auto& weak : listeners_) {
-        if (const auto listener = weak.lock()) listener->setAccepting(accepting);
-      }
-    };
-    setAccepting(false);
-    const bool idle = connections_.empty();
-    if (!idle) setAccepting(true);
+    for (const auto& weak : listeners_) {
+      if (const auto listener = weak.lock()) listener->stopAccepting();
+    }
+    const bool idle = isIdle();
+    if (!idle) goOn();
     answer(idle);
   });
+}
+
+void ConnectionService::closeDoorIfIdle(std::function<void(bool idle)> answer) {
+  loop_.post([this, answer = std::move(answer)] {
+    const auto closed = [this, answer](bool isClosed) {
+      const bool idle = isClosed && isIdle();
+      if (!idle) goOn();
+      answer(idle);
+    };
+    if (!door_ || !isIdle()) return closed(true);
+    door_->giveNameUp(closed);
+  });
+}
+
+void ConnectionService::goOn() {
+  for (const auto& weak : listeners_) {
+    if (const auto listener = weak.lock()) listener->goOnAccepting();
+  }
+  if (door_) door_->takeNameAgain();
 }
 
 std::shared_ptr<Connection> ConnectionService::adopt(UniqueFd socket, const AuditToken& peer) {

@@ -13,7 +13,9 @@
 #include "platform/work/pool.h"
 #include "platform/work/run_loop.h"
 #include "platform/zeph/bus_connection.h"
+#include "platform/zeph/bus_door.h"
 #include "platform/zeph/bus_listener.h"
+#include "platform/zeph/door.h"
 #include "platform/zeph/listener.h"
 #include "platform/zeph/runtime_folder.h"
 
@@ -45,14 +47,24 @@ class ConnectionService final : private ListenerHost, private ConnectionObserver
   /// listener.
   Result<std::shared_ptr<Connection>> connect(const Endpoint& endpoint, std::chrono::milliseconds timeout);
 
+  /// Opens a door on the session bus, if there is one; at most once. Nothing depends on it.
+  void openDoor(DoorPlan plan);
+
   /// Stops accepting and tells `answer`, on the I/O thread, whether no peer is connected or waiting
-  /// for a decision. When there is one, accepting goes on.
+  /// for a decision. When there is one, accepting goes on. Sockets of the service's own are out of sight
+  /// meanwhile; those of a launch service collect clients for the next process.
   void stopAcceptingIfIdle(std::function<void(bool idle)> answer);
+  /// To be called when that was so: closes the door too, and tells `answer`, on the I/O thread, whether
+  /// nobody came through it until then. When somebody did, the door opens again and accepting goes on.
+  void closeDoorIfIdle(std::function<void(bool idle)> answer);
 
  private:
   std::shared_ptr<BusListener> makeListener(UniqueFd socket, std::string path, bool ownsFile);
 
   // I/O thread.
+  /// Whether there is neither a connection nor a call that asks for one.
+  bool isIdle() const { return connections_.empty() && (!door_ || door_->visitsInWork() == 0); }
+  void goOn();
   std::shared_ptr<Connection> adopt(UniqueFd socket, const AuditToken& peer) override;
   void connectionEnded(const std::shared_ptr<Connection>& connection) override;
   void fault(const std::string& line) override;
@@ -65,6 +77,7 @@ class ConnectionService final : private ListenerHost, private ConnectionObserver
   // I/O thread.
   std::set<std::shared_ptr<Connection>> connections_;
   std::vector<std::weak_ptr<BusListener>> listeners_;
+  std::shared_ptr<BusDoor> door_;
 
   std::thread thread_;  // last: uses everything above
 };

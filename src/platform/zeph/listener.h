@@ -3,6 +3,8 @@
 
 #include <memory>
 
+#include "platform/base/result.h"
+#include "platform/base/unique_fd.h"
 #include "platform/base/value.h"
 #include "platform/zeph/connection.h"
 
@@ -22,7 +24,7 @@ class ListenerDelegate {
 };
 
 /// A place where clients connect. Peers must be of the service's own user or root (a service that
-/// is root itself takes every user); others are closed at once. *Thread-safe.*
+/// is root itself takes every user); others are closed at once. *Thread-safe*, but for admit().
 class Listener {
  public:
   virtual ~Listener() = default;
@@ -33,6 +35,9 @@ class Listener {
   virtual void setDelegate(std::weak_ptr<ListenerDelegate> delegate) = 0;
   /// Starts accepting. Clients that connected before have waited.
   virtual void resume() = 0;
+  /// Takes a connected socket as if `peer` had connected; an error for the peer when that may not be. I/O
+  /// thread.
+  virtual Result<std::weak_ptr<Connection>, CallError> admit(UniqueFd socket, const AuditToken& peer) = 0;
   /// Ends accepting and removes the socket file. Connections that exist go on.
   virtual void invalidate() = 0;
 };

@@ -8,6 +8,7 @@
 
 #include <cerrno>
 #include <string_view>
+#include <thread>
 
 #include "platform/base/directory.h"
 
@@ -24,9 +25,21 @@ void removeSockets(const std::string& path) {
   }
 }
 
+/// Takes the lock, as soon as whoever has it lets go within `patience`.
+bool takeLock(const UniqueFd& file, std::chrono::milliseconds patience) {
+  constexpr std::chrono::milliseconds pause{10};
+  const auto deadline = std::chrono::steady_clock::now() + patience;
+  while (::flock(file.get(), LOCK_EX | LOCK_NB) != 0) {
+    if (std::chrono::steady_clock::now() >= deadline) return false;
+    std::this_thread::sleep_for(pause);
+  }
+  return true;
+}
+
 }  // namespace
 
-Result<std::unique_ptr<RuntimeFolder>> RuntimeFolder::claim(const std::string& path) {
+Result<std::unique_ptr<RuntimeFolder>> RuntimeFolder::claim(const std::string& path,
+                                                            std::chrono::milliseconds patience) {
   if (path.empty())
     return SystemError{"no runtime folder: neither BRIVOD_RUNTIME_DIR nor XDG_RUNTIME_DIR is set"};
   if (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST) return SystemError{"make " + path, errno};
@@ -37,9 +50,7 @@ Result<std::unique_ptr<RuntimeFolder>> RuntimeFolder::claim(const std::string& p
   if (::fchmod(folder.get(), 0700) != 0) return SystemError{"set the mode of " + path, errno};
   UniqueFd lock(::openat(folder.get(), "lock", O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
   if (!lock) return SystemError{"make a lock in " + path, errno};
-  if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
-    return SystemError{"another service is running in " + path};
-  }
+  if (!takeLock(lock, patience)) return SystemError{"another service is running in " + path};
   removeSockets(path);
   return std::unique_ptr<RuntimeFolder>(new RuntimeFolder(path, std::move(lock)));
 }

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <chrono>
 #include <memory>
 #include <string>
 
@@ -14,8 +15,9 @@ class RuntimeFolder {
  public:
   /// Makes the folder when it is missing (not those above it), insists that it belongs to this user
   /// and sets it to mode 0700, locks it, and removes sockets that a service which died left behind.
-  /// An error when another service runs there.
-  static Result<std::unique_ptr<RuntimeFolder>> claim(const std::string& path);
+  /// An error when another service runs there and has not ended after `patience`.
+  static Result<std::unique_ptr<RuntimeFolder>> claim(const std::string& path,
+                                                      std::chrono::milliseconds patience = {});
 
   const std::string& path() const { return path_; }
   std::string pathOf(const std::string& name) const { return path_ + "/" + name; }

@@ -175,6 +175,13 @@ std::shared_ptr<MSRemoteCameraDevice> MSRemoteCameraDeviceManager::remoteDeviceF
   return record == remoteCameraDevices_.end() ? nullptr : *record;
 }
 
+std::shared_ptr<zeph::Listener> MSRemoteCameraDeviceManager::listenerOfDevice(const std::string& uuid) const {
+  const MutexLock lock(remoteCameraDevicesLock_);
+  const auto record = std::ranges::find(remoteCameraDevices_, uuid, &MSRemoteCameraDevice::uuidString);
+  if (record == remoteCameraDevices_.end() || !(*record)->camera()) return nullptr;
+  return (*record)->camera()->listener();
+}
+
 // ------------------------------------------------------------------------------------------------- clients
 
 bool MSRemoteCameraDeviceManager::shouldAcceptNewConnection(

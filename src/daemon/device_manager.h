@@ -59,6 +59,9 @@ class MSRemoteCameraDeviceManager final : public zeph::ListenerDelegate,
       BRIVO_EXCLUDES(remoteCameraDevicesLock_);
   std::shared_ptr<MSRemoteCameraDevice> remoteDeviceForUUID(const std::string& uuid) const
       BRIVO_EXCLUDES(remoteCameraDevicesLock_);
+  /// Where clients of an opened device connect; null when there is no such device or it is not open.
+  std::shared_ptr<zeph::Listener> listenerOfDevice(const std::string& uuid) const
+      BRIVO_EXCLUDES(remoteCameraDevicesLock_);
 
   // Clients of the manager.
   bool shouldAcceptNewConnection(zeph::Listener& listener,

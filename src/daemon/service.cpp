@@ -5,6 +5,7 @@
 #include "platform/decoding/worker_program.h"
 #include "platform/preferences/preferences_store.h"
 #include "platform/settings/folders.h"
+#include "protocol/protocols.h"
 #include "util/log.h"
 
 namespace brivo {
@@ -12,6 +13,8 @@ namespace brivo {
 namespace {
 
 constexpr std::chrono::seconds kDefaultIdleTime{60};
+/// A service that is activated may be the next one of one that is still ending.
+constexpr std::chrono::seconds kPatienceWithLast{10};
 constexpr const char* kDataFolder = "org.orvid.imagecapture";
 constexpr const char* kMatchingList = "OrvidCore/DeviceMatchingInfo.plist";
 
@@ -44,15 +47,19 @@ Service::Service(RunLoop& mainLoop, Settings settings, std::unique_ptr<zeph::Run
 Result<std::unique_ptr<Service>> Service::start(RunLoop& mainLoop) {
   OVLog("brivo[zeph]", "{}", "Launching brivo [zeph]");
   Settings settings = Settings::fromEnvironment();
-  auto folder = zeph::RuntimeFolder::claim(settings.runtimeDir);
+  auto folder = zeph::RuntimeFolder::claim(
+      settings.runtimeDir, settings.startedByBus ? kPatienceWithLast : std::chrono::seconds(0));
   if (!folder.ok()) return folder.error();
   std::unique_ptr<Service> service(new Service(mainLoop, std::move(settings), *std::move(folder)));
   service->manager_->startMSDeviceNotifications();  // without it the registry stays empty, nothing more
   if (const auto error = service->listen()) return *error;
+  service->openFrontDoor();
+  LaunchService::ready();
   return service;
 }
 
 Service::~Service() {
+  launchService_.stopping();
   idleExit_.reset();
   if (listener_) listener_->invalidate();
   manager_->stop();
@@ -66,14 +73,37 @@ std::optional<SystemError> Service::listen() {
   listener_ = *std::move(listener);
   listener_->setDelegate(manager_);
   listener_->resume();
-  if (connections_.startedByActivation()) exitWhenIdle();
+  if (connections_.startedByActivation() || settings_.startedByBus) exitWhenIdle();
   return std::nullopt;
 }
 
+void Service::openFrontDoor() {
+  frontDoor_ = std::make_shared<FrontDoor>(mainLoop_, listener_, manager_);
+  connections_.openDoor({FrontDoor::kName, frontDoorProtocol(), frontDoor_,
+                         [](const std::string& line) { OVLog("frontDoor", "{}", line); }});
+}
+
 void Service::exitWhenIdle() {
-  idleExit_ = std::make_unique<IdleExit>(
-      mainLoop_, transactions_, settings_.idleTime.value_or(kDefaultIdleTime),
-      [this](std::function<void(bool)> answer) { connections_.stopAcceptingIfIdle(std::move(answer)); });
+  idleExit_ =
+      std::make_unique<IdleExit>(mainLoop_, transactions_, settings_.idleTime.value_or(kDefaultIdleTime),
+                                 [this](const std::function<void(bool)>& answer) { leaveIfIdle(answer); });
+}
+
+void Service::leaveIfIdle(const std::function<void(bool idle)>& answer) {
+  connections_.stopAcceptingIfIdle([this, answer](bool idle) {
+    if (!idle) return answer(false);
+    mainLoop_.post([this, answer] { leaveFrontDoor(answer); });
+  });
+}
+
+/// The launch service first: a call to a name that nobody has makes it start the service, which would do
+/// nothing as long as it takes this process for one that stays.
+void Service::leaveFrontDoor(const std::function<void(bool idle)>& answer) {
+  launchService_.stopping();
+  connections_.closeDoorIfIdle([this, answer](bool idle) {
+    if (!idle) mainLoop_.post([this] { launchService_.notYet(); });
+    answer(idle);
+  });
 }
 
 DeviceServices Service::deviceServices() {

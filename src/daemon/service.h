@@ -8,10 +8,12 @@
 #include "access/access_database.h"
 #include "access/device_access_manager.h"
 #include "daemon/device_manager.h"
+#include "daemon/front_door.h"
 #include "platform/applications/desktop_catalogue.h"
 #include "platform/decoding/imaging_service.h"
 #include "platform/identity/task_identity.h"
 #include "platform/keepalive/idle_exit.h"
+#include "platform/keepalive/launch_service.h"
 #include "platform/movies/movie_service.h"
 #include "platform/movies/worker_movie_reader.h"
 #include "platform/power/logind_inhibitors.h"
@@ -36,9 +38,14 @@ class Service {
   Service(RunLoop& mainLoop, Settings settings, std::unique_ptr<zeph::RuntimeFolder> folder);
   std::optional<SystemError> listen();
   DeviceServices deviceServices();
+  void openFrontDoor();
   void exitWhenIdle();
+  /// Ends what brings new clients, unless one is there or comes meanwhile; `answer` hears whether nobody did.
+  void leaveIfIdle(const std::function<void(bool idle)>& answer);
+  void leaveFrontDoor(const std::function<void(bool idle)>& answer);
 
   RunLoop& mainLoop_;
+  LaunchService launchService_{mainLoop_};
   const Settings settings_;
   const std::unique_ptr<zeph::RuntimeFolder> folder_;
 
@@ -58,6 +65,7 @@ class Service {
   VolumeMonitor volumes_;
   std::shared_ptr<MSRemoteCameraDeviceManager> manager_;
   std::shared_ptr<zeph::Listener> listener_;
+  std::shared_ptr<FrontDoor> frontDoor_;
   std::unique_ptr<IdleExit> idleExit_;
 };
 

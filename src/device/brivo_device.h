@@ -41,6 +41,7 @@ class BrivoDevice final : public CameraDevice,
 
   const Url& url() const { return url_; }
   const Endpoint& endpoint() const { return listener_->endpoint(); }
+  const std::shared_ptr<zeph::Listener>& listener() const { return listener_; }
   /// The property dictionary as it is now.
   Dictionary cameraDictionary() const BRIVO_EXCLUDES(propertiesLock_);
   void setCameraProperty(std::string_view key, Value value) BRIVO_EXCLUDES(propertiesLock_);

@@ -40,13 +40,20 @@ constexpr Member kKorvelMembers[] = {
     {selectors::kNotifyDeviceClose, signal, "v", "", "location,", kDeclaredOnly},
 };
 
+constexpr Member kFrontDoorMembers[] = {
+    {selectors::kDoorOpenManager, method, "", "h", "socket,"},
+    {selectors::kDoorOpenDevice, method, "s", "ha{sv}", "uuid,socket,device,"},
+};
+
 constexpr zeph::Protocol kManagerProtocol{"org.orvid.OVZEPHDeviceManagerProtocol", kManagerMembers};
 constexpr zeph::Protocol kKorvelProtocol{"org.orvid.KorvelProtocol", kKorvelMembers};
+constexpr zeph::Protocol kFrontDoorProtocol{"org.orvid.FrontDoor1", kFrontDoorMembers};
 
 }  // namespace
 
 const zeph::Protocol& deviceManagerProtocol() { return kManagerProtocol; }
 const zeph::Protocol& korvelProtocol() { return kKorvelProtocol; }
+const zeph::Protocol& frontDoorProtocol() { return kFrontDoorProtocol; }
 
 const zeph::ClassSet& allowedClasses() {
   using enum Value::Class;

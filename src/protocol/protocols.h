@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-// The two protocols between the service and its clients, one row per member.
+// The protocols between the service and its clients, one row per member.
 #pragma once
 
 #include <initializer_list>
@@ -15,6 +15,10 @@ const zeph::Protocol& deviceManagerProtocol();
 
 /// KorvelProtocol: a session with one device.
 const zeph::Protocol& korvelProtocol();
+
+/// FrontDoor1: what the service has on the session bus. Its methods hand out connections that speak the other
+/// two.
+const zeph::Protocol& frontDoorProtocol();
 
 /// What argument 0 of a restricted selector may be made of.
 const zeph::ClassSet& allowedClasses();

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-// The selectors of both protocols, as code names them.
+// The selectors of the protocols, as code names them.
 #pragma once
 
 #include <string_view>
@@ -33,5 +33,9 @@ inline constexpr std::string_view kNotifyAddedItems = "notifyAddedItems:";
 inline constexpr std::string_view kNotifyPtpEvent = "notifyPtpEvent:";
 inline constexpr std::string_view kNotifyPercentCompleted = "notifyContentCatalogPercentCompleted:";
 inline constexpr std::string_view kNotifyDeviceClose = "notifyDeviceCloseWithUSBLocationID:";
+
+// The door on the session bus.
+inline constexpr std::string_view kDoorOpenManager = "OpenManager";
+inline constexpr std::string_view kDoorOpenDevice = "OpenDevice";
 
 }  // namespace brivo::selectors

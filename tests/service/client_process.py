@@ -21,6 +21,9 @@ class Client:
     def manager(self):
         return Manager(self)
 
+    def wait_for_devices(self, count):
+        wait_until(lambda: len(self.manager.devices()) == count, f"{count} devices")
+
     def open(self, path):
         self.device = Device(self.manager, path)
         return self.device.properties

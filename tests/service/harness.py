@@ -82,9 +82,10 @@ class Service:
         if start:
             self.start()
 
-    def start(self):
+    def start(self, prefix=()):
         with open(self.log_path, "ab") as log:
-            self.process = subprocess.Popen(self.command, env=self.environment, stdin=subprocess.DEVNULL, stderr=log)
+            self.process = subprocess.Popen([*prefix, *self.command], env=self.environment, stdin=subprocess.DEVNULL,
+                                            stderr=log)
         wait_until(lambda: self.process.poll() is not None or os.path.exists(f"{self.runtime}/manager"), "the socket")
         if self.process.poll() is not None:
             raise AssertionError("brivod ended at once:\n" + self.log())
@@ -163,7 +164,8 @@ def make_card(folder, files, root="DCIM"):
 
 
 class Connection:
-    """One peer-to-peer connection. Signals are kept by a thread that runs a GLib loop."""
+    """One peer-to-peer connection, to an address or over a socket that is connected already. Signals are kept by a thread
+    that runs a GLib loop."""
 
     def __init__(self, address, interface):
         self.interface = interface
@@ -193,7 +195,11 @@ class Connection:
 
     def _connect(self, address):
         flags = Gio.DBusConnectionFlags.AUTHENTICATION_CLIENT | Gio.DBusConnectionFlags.DELAY_MESSAGE_PROCESSING
-        self.bus = Gio.DBusConnection.new_for_address_sync(address, flags, None, None)
+        if isinstance(address, int):
+            stream = Gio.Socket.new_from_fd(address).connection_factory_create_connection()
+            self.bus = Gio.DBusConnection.new_sync(stream, None, flags, None, None)
+        else:
+            self.bus = Gio.DBusConnection.new_for_address_sync(address, flags, None, None)
         self.bus.connect("closed", lambda *_: self.closed.set())
         self.bus.signal_subscribe(None, self.interface, None, None, None, 0, self._on_signal)
         self.bus.start_message_processing()
@@ -214,7 +220,10 @@ class Connection:
     def close(self):
         with contextlib.suppress(GLib.Error):
             self.bus.close_sync(None)
-        self._loop.quit()
+        # On the loop: it may not have begun to run yet.
+        quit_loop = GLib.idle_source_new()
+        quit_loop.set_callback(lambda *_: self._loop.quit())
+        quit_loop.attach(self._context)
         self._thread.join(WAIT)
 
 

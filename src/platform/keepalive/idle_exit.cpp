@@ -23,16 +23,25 @@ struct IdleExit::State : std::enable_shared_from_this<State> {
   }
 
   void waited(std::uint64_t wait) {
-    if (wait != waits || transactions.count() > 0) return;  // a later wait counts, or somebody came
+    // A later wait counts, or somebody came, or is asked about already.
+    if (wait != waits || checking || transactions.count() > 0) return;
+    checking = true;
     lastCheck([weak = weak_from_this()](bool idle) {
       const auto self = weak.lock();
       if (!self) return;
-      if (idle) {
-        self->loop.quit();
-      } else {
-        self->becameIdle();
-      }
+      self->loop.post([weak, idle] {
+        if (const auto state = weak.lock()) state->checked(idle);
+      });
     });
+  }
+
+  void checked(bool idle) {
+    checking = false;
+    if (idle) {
+      loop.quit();
+    } else {
+      startWaiting();
+    }
   }
 
   RunLoop& loop;
@@ -40,6 +49,7 @@ struct IdleExit::State : std::enable_shared_from_this<State> {
   const std::chrono::seconds idleTime;
   const LastCheck lastCheck;
   std::uint64_t waits = 0;
+  bool checking = false;
 };
 
 IdleExit::IdleExit(RunLoop& loop, Transactions& transactions, std::chrono::seconds idleTime,

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
-#include <thread>
+#include <vector>
 
 #include "platform/keepalive/idle_exit.h"
 #include "platform/keepalive/transactions.h"
@@ -59,6 +59,23 @@ TEST(IdleExitTest, ATransactionKeepsItAndTheLastCheckMayRefuse) {
   });
   loop.run();
   EXPECT_EQ(checks, 2);
+}
+
+TEST(IdleExitTest, OneLastCheckIsMadeAtATime) {
+  RunLoop loop;
+  Transactions transactions;
+  std::vector<std::function<void(bool)>> checks;
+  const IdleExit exit(loop, transactions, 0s, [&](const auto& answer) { checks.push_back(answer); });
+  loop.postAfter(20ms, [&] {
+    transactions.begin("x").reset();  // somebody who comes and goes during the check
+    loop.postAfter(20ms, [&] {
+      EXPECT_EQ(checks.size(), 1u);
+      checks[0](false);
+      loop.postAfter(20ms, [&] { checks.at(1)(true); });
+    });
+  });
+  loop.run();
+  EXPECT_EQ(checks.size(), 2u);
 }
 
 }  // namespace

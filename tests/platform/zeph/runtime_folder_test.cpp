@@ -4,7 +4,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+
 #include <unistd.h>
+#include <future>
 
 #include "support/temporary_folder.h"
 
@@ -42,6 +44,17 @@ TEST(RuntimeFolderTest, OneServiceAtATime) {
     EXPECT_THAT(second.error().text(), HasSubstr("another service"));
   }
   EXPECT_TRUE(RuntimeFolder::claim(parent.path()).ok()) << "the claim goes with its holder";
+}
+
+TEST(RuntimeFolderTest, WhoHasPatienceGetsItWhenTheFirstHasEnded) {
+  const test::TemporaryFolder parent;
+  auto first = RuntimeFolder::claim(parent.path());
+  ASSERT_TRUE(first.ok());
+  EXPECT_FALSE(RuntimeFolder::claim(parent.path(), std::chrono::milliseconds(20)).ok());
+  auto second = std::async(
+      std::launch::async, [&] { return RuntimeFolder::claim(parent.path(), std::chrono::seconds(20)).ok(); });
+  first->reset();
+  EXPECT_TRUE(second.get());
 }
 
 TEST(RuntimeFolderTest, SocketsOfAServiceThatDiedAreRemoved) {

@@ -15,6 +15,8 @@
 
 namespace brivo::zeph {
 
+template class ReplyOf<Passage>;
+
 namespace {
 
 constexpr const char* kBus = "org.freedesktop.DBus";

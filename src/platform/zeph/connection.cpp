@@ -3,6 +3,8 @@
 
 namespace brivo::zeph {
 
+template class ReplyOf<Arguments>;
+
 void RemoteObjectProxy::send(std::string_view selector, std::shared_ptr<const Arguments> arguments) const {
   if (const auto connection = connection_.lock()) {
     connection->send(selector, std::move(arguments), onError_);

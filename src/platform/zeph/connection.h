@@ -56,29 +56,45 @@ class ReplyOf {
   using Sink = std::function<void(Result<Values, CallError>)>;
 
   /// `sink` is called once, on the thread that answers.
-  explicit ReplyOf(Sink sink) : state_(std::make_shared<State>(std::move(sink))) {}
+  explicit ReplyOf(Sink sink);
 
-  void operator()(Values values) const { state_->answer(std::move(values)); }
-  void fail(CallError error) const { state_->answer(std::move(error)); }
+  void operator()(Values values) const;
+  void fail(CallError error) const;
 
  private:
-  struct State {
-    explicit State(Sink handler) : sink(std::move(handler)) {}
-    ~State() { answer(CallError{kErrorNoReply, "The request was dropped"}); }
-    State(const State&) = delete;
-    State& operator=(const State&) = delete;
-
-    void answer(Result<Values, CallError> given) {
-      if (!answered.exchange(true)) sink(std::move(given));
-    }
-
-    Sink sink;
-    std::atomic<bool> answered = false;
-  };
-
+  struct State;
   std::shared_ptr<State> state_;
 };
 
+template <class Values>
+struct ReplyOf<Values>::State {
+  explicit State(Sink handler) : sink(std::move(handler)) {}
+  ~State() { answer(CallError{kErrorNoReply, "The request was dropped"}); }
+  State(const State&) = delete;
+  State& operator=(const State&) = delete;
+
+  void answer(Result<Values, CallError> given) {
+    if (!answered.exchange(true)) sink(std::move(given));
+  }
+
+  Sink sink;
+  std::atomic<bool> answered = false;
+};
+
+template <class Values>
+ReplyOf<Values>::ReplyOf(Sink sink) : state_(std::make_shared<State>(std::move(sink))) {}
+
+template <class Values>
+void ReplyOf<Values>::operator()(Values values) const {
+  state_->answer(std::move(values));
+}
+
+template <class Values>
+void ReplyOf<Values>::fail(CallError error) const {
+  state_->answer(std::move(error));
+}
+
+extern template class ReplyOf<Arguments>;
 using Reply = ReplyOf<Arguments>;
 
 /// A call of the peer on the exported object.

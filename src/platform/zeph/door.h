@@ -21,6 +21,8 @@ struct Passage {
   Arguments values;
 };
 
+extern template class ReplyOf<Passage>;
+
 /// A call of a method of the door.
 struct Visit {
   /// One of the door's protocol, valid for the program's life.

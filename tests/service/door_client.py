@@ -6,8 +6,8 @@ import sys
 import time
 
 from gi.repository import GLib
-from front_door import SessionBus, device_list, error_name, knock, open_device, open_manager
-from harness import MANAGER, Connection, Dataset, unpacked, variants, wait_until
+from front_door import SessionBus, device_list, error_name, knock, open_device, open_manager, read_all, wait_for_file
+from harness import MANAGER, Connection
 
 
 class OtherBus(SessionBus):
@@ -23,16 +23,9 @@ def read(bus, path):
     contexts = device_list(open_manager(bus))
     device = open_device(bus, contexts[0]["OVDeviceHandle"])
     device.call("requestStartUsingDeviceWithReply")
-    device.call("enumerateContentWithOptions", GLib.Variant("(a{sv})", ({},)))
-
-    def files():
-        batches = [unpacked(arguments, None)["OVMSObjectInfoArray"] for arguments in device.named("notifyAddedItems")]
-        return [d for d in (Dataset(data) for batch in batches for data in batch) if d.association == 0]
-    first = wait_until(files, "a file")[0]
-    answer = device.call("requestReadDataFromObjectHandle_options_withReply",
-                         GLib.Variant("(ta{sv})", (first.handle, variants({}))))
+    first = wait_for_file(device)
     return {"sees_the_socket": os.path.exists(path), "devices": len(contexts), "name": first.filename,
-            "bytes": answer["OVReadData"].hex()}
+            "bytes": read_all(device, first.handle).hex()}
 
 
 def is_let_in(bus, handle):

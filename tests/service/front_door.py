@@ -10,7 +10,7 @@ import subprocess
 import tempfile
 
 from gi.repository import Gio, GLib
-from harness import KORVEL, MANAGER, PATH, WAIT, Connection, wait_until
+from harness import KORVEL, MANAGER, PATH, WAIT, Connection, Dataset, unpacked, wait_until
 
 NAME = "org.orvid.brivod"
 DOOR = "org.orvid.FrontDoor1"
@@ -111,6 +111,21 @@ def open_device(bus, handle):
 
 def device_list(manager):
     return manager.call("requestDeviceListWithReply")["OVDeviceContexts"]
+
+
+def wait_for_file(device):
+    """Has the catalogue sent: the first file in it."""
+    device.call("enumerateContentWithOptions", GLib.Variant("(a{sv})", ({},)))
+
+    def files():
+        batches = [unpacked(arguments, None)["OVMSObjectInfoArray"] for arguments in device.named("notifyAddedItems")]
+        return [d for d in (Dataset(data) for batch in batches for data in batch) if d.association == 0]
+    return wait_until(files, "a file")[0]
+
+
+def read_all(device, handle):
+    return device.call("requestReadDataFromObjectHandle_options_withReply",
+                       GLib.Variant("(ta{sv})", (handle, {})))["OVReadData"]
 
 
 class WithoutDescriptors:

@@ -7,20 +7,7 @@ set -uo pipefail
 cd "$1/po" || exit 1
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
-failed=0
-
-# check WHAT COMMAND...: runs it; when it fails, shows what it printed and goes on.
-check() {
-  local what=$1
-  shift
-  if "$@" >"$work/output" 2>&1; then
-    echo "ok: $what"
-  else
-    echo "NOT OK: $what" >&2
-    cat "$work/output" >&2
-    failed=1
-  fi
-}
+source ../tests/support/checks.sh
 
 keys() { msgattrib --no-obsolete --no-wrap --sort-output "$@" | sed -n 's/^msgid "\(.\+\)"$/\1/p'; }
 has_all_keys() { diff "$work/keys" <(keys "$1"); }

@@ -31,25 +31,6 @@ using testing::Not;
 using testing::SizeIs;
 using Table = AccessDatabase::Table;
 
-class DatabaseFaultsTest : public test::AccessDatabaseTest {
- protected:
-  void grantOne() { open()->addApplicationWithBundleIdentifier("org.example.App", true); }
-  /// That nothing comes of any operation, and none changes the file.
-  void expectUseless(AccessDatabase& database) {
-    const std::string before = test::readFile(file());
-    database.addApplicationWithBundleIdentifier("org.example.New", true);
-    database.addControlApplicationWithBundleIdentifier("org.example.New", true);
-    database.updateApplicationWithBundleIdentifier("org.example.App", true);
-    database.revokeApplicationWithBundleIdentifier("org.example.App");
-    database.revokeControlApplicationWithBundleIdentifier("org.example.App");
-    EXPECT_THAT(database.bundleIdentifiersAccessingExternalCameras(), IsEmpty());
-    EXPECT_THAT(database.bundleIdentifiersAccessingExternalCamerasWithStatus(), IsEmpty());
-    EXPECT_THAT(database.bundleIdentifiersControllingExternalCameras(), IsEmpty());
-    EXPECT_THAT(database.rowsOf("org.example.App", Table::access), IsEmpty());
-    EXPECT_TRUE(test::readFile(file()) == before) << "the file was changed";
-  }
-};
-
 /// Root may do what modes forbid; others may not. What the folder holds is theirs while this lives.
 class AsOrdinaryUser {
  public:
@@ -71,6 +52,35 @@ class AsOrdinaryUser {
  private:
   static constexpr uid_t kNobody = 65534;
   const bool isRoot_ = ::geteuid() == 0;
+};
+
+class DatabaseFaultsTest : public test::AccessDatabaseTest {
+ protected:
+  void grantOne() { open()->addApplicationWithBundleIdentifier("org.example.App", true); }
+  /// What is logged when an ordinary user grants and revokes; the one grant is there and stays.
+  std::string logOfChangesThatFail() {
+    const AsOrdinaryUser user(folder());
+    const test::StandardErrorCapture log;
+    const auto database = open();
+    database->addApplicationWithBundleIdentifier("org.example.Other", true);
+    database->revokeApplicationWithBundleIdentifier("org.example.App");
+    EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
+    return log.text();
+  }
+  /// That nothing comes of any operation, and none changes the file.
+  void expectUseless(AccessDatabase& database) {
+    const std::string before = test::readFile(file());
+    database.addApplicationWithBundleIdentifier("org.example.New", true);
+    database.addControlApplicationWithBundleIdentifier("org.example.New", true);
+    database.updateApplicationWithBundleIdentifier("org.example.App", true);
+    database.revokeApplicationWithBundleIdentifier("org.example.App");
+    database.revokeControlApplicationWithBundleIdentifier("org.example.App");
+    EXPECT_THAT(database.bundleIdentifiersAccessingExternalCameras(), IsEmpty());
+    EXPECT_THAT(database.bundleIdentifiersAccessingExternalCamerasWithStatus(), IsEmpty());
+    EXPECT_THAT(database.bundleIdentifiersControllingExternalCameras(), IsEmpty());
+    EXPECT_THAT(database.rowsOf("org.example.App", Table::access), IsEmpty());
+    EXPECT_TRUE(test::readFile(file()) == before) << "the file was changed";
+  }
 };
 
 TEST_F(DatabaseFaultsTest, AFolderThatCannotBeMadeIsLoggedAndNothingIsGranted) {
@@ -186,27 +196,13 @@ TEST_F(DatabaseFaultsTest, FlagsThatAreNoNumbersCountAsUnconfirmed) {
 TEST_F(DatabaseFaultsTest, AReadOnlyFileGivesItsGrantsAndKeepsThem) {
   grantOne();
   ASSERT_EQ(::chmod(file().c_str(), 0444), 0);
-  const AsOrdinaryUser user(folder());
-  const test::StandardErrorCapture log;
-  const auto database = open();
-  database->addApplicationWithBundleIdentifier("org.example.Other", true);
-  database->revokeApplicationWithBundleIdentifier("org.example.App");
-  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
-  EXPECT_THAT(log.text(), HasSubstr("ovaccess ! attempt to write a readonly database"));
+  EXPECT_THAT(logOfChangesThatFail(), HasSubstr("ovaccess ! attempt to write a readonly database"));
 }
 
 TEST_F(DatabaseFaultsTest, AReadOnlyFolderGivesItsGrantsAndKeepsThem) {
   grantOne();
   ASSERT_EQ(::chmod(folder().c_str(), 0555), 0);
-  {
-    const AsOrdinaryUser user(folder());
-    const test::StandardErrorCapture log;
-    const auto database = open();
-    database->addApplicationWithBundleIdentifier("org.example.Other", true);
-    database->revokeApplicationWithBundleIdentifier("org.example.App");
-    EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
-    EXPECT_THAT(log.text(), HasSubstr("ovaccess ! "));
-  }
+  EXPECT_THAT(logOfChangesThatFail(), HasSubstr("ovaccess ! "));
   ::chmod(folder().c_str(), 0755);
 }
 

@@ -171,8 +171,8 @@ TEST(MovieFrameTest, HighDefinitionIsInItsOwnColours) {
 
 TEST(MovieFrameTest, NothingIsReadWithoutEnd) {
   // Pictures that none of them decodes, for as long as the file claims.
-  TrackBytes track{.samples = {}};
-  for (int i = 0; i < 200; ++i) track.samples.push_back(std::string(1'000'000, 'x'));
+  TrackBytes track;
+  track.samples.assign(200, std::string(1'000'000, 'x'));
   const CountingSource source(MovieBytes{.tracks = {track}}.build());
   EXPECT_FALSE(firstFrameOf(source, {160, 0}));
   EXPECT_LT(source.bytesRead(), std::size_t{70} << 20);

@@ -91,6 +91,8 @@ int BusLink::start(UniqueFd socket) {
     constexpr int yes = 1;
     ::setsockopt(socket.get(), SOL_SOCKET, SO_PASSRIGHTS, &yes, sizeof yes);
   }
+  watched_ = socket.duplicate();
+  if (!watched_) return -errno;
   const int fd = socket.release();  // sd-bus closes it from here on
   result = sd_bus_set_fd(bus_, fd, fd);
   if (result < 0) {
@@ -120,7 +122,7 @@ int BusLink::start(UniqueFd socket) {
     static_cast<BusLink*>(self)->turn();
     return 0;
   };
-  result = sd_event_add_io(event_, &io_, fd, EPOLLIN, onIo, this);
+  result = sd_event_add_io(event_, &io_, watched_.get(), EPOLLIN, onIo, this);
   if (result >= 0) result = sd_event_add_time(event_, &timer_, CLOCK_MONOTONIC, UINT64_MAX, 0, onTime, this);
   if (result >= 0) result = sd_event_add_defer(event_, &again_, onAgain, this);
   return result;  // the deferred source is on: the first turn comes with the next pass of the loop

@@ -116,6 +116,9 @@ class BusLink {
 
   sd_event* event_;
   sd_bus* bus_ = nullptr;
+  // sd-bus closes its descriptor when the peer hangs up. A process that is being started may hold the socket
+  // a moment longer, and what the event loop watches has to be taken from it before that.
+  UniqueFd watched_;
   sd_event_source* io_ = nullptr;
   sd_event_source* timer_ = nullptr;
   sd_event_source* again_ = nullptr;

@@ -1,7 +1,12 @@
 // SPDX-License-Identifier: MIT
 // Connections between honest peers.
 #include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/prctl.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <limits>
 #include <thread>
@@ -112,6 +117,25 @@ TEST_F(EchoTest, NoncharactersAreMendedAndNotRefused) {
   const Answer answer = echo(client, {{"text", "a\uFFFEb\uFDD0c\U0010FFFFd\uFFFC"}});
   ASSERT_TRUE(answer.ok());
   EXPECT_EQ(*answer->front().get<Dictionary>()->string("text"), "a\uFFFDb\uFFFDc\uFFFDd\uFFFC");
+}
+
+/// A process that is being started has copies of all descriptors until it executes its program.
+TEST_F(EchoTest, APeerMayHangUpWhileAProcessIsStarted) {
+  for (int i = 0; i < 20; ++i) {
+    const UniqueFd peer = test::connectRaw(socketPath());
+    test::sendAll(peer.get(), test::authentication());
+    ASSERT_FALSE(test::receive(peer.get(), 1).empty());
+    const pid_t child = ::fork();
+    if (child == 0) {
+      ::prctl(PR_SET_PDEATHSIG, SIGKILL);
+      ::pause();
+      ::_exit(0);
+    }
+    ::shutdown(peer.get(), SHUT_RDWR);
+    EXPECT_TRUE(echo(connectClient(), {}).ok());
+    ::kill(child, SIGKILL);
+    ::waitpid(child, nullptr, 0);
+  }
 }
 
 TEST_F(EchoTest, ACallThatIsOnlyDeclaredIsAnsweredAsUnknown) {

@@ -15,6 +15,8 @@ namespace {
 constexpr std::chrono::seconds kDefaultIdleTime{60};
 /// A service that is activated may be the next one of one that is still ending.
 constexpr std::chrono::seconds kPatienceWithLast{10};
+/// A process that a killed service was just starting may hold its lock until it executes its program.
+constexpr std::chrono::milliseconds kPatienceWithKilled{250};
 constexpr const char* kDataFolder = "org.orvid.imagecapture";
 constexpr const char* kMatchingList = "OrvidCore/DeviceMatchingInfo.plist";
 
@@ -47,8 +49,8 @@ Service::Service(RunLoop& mainLoop, Settings settings, std::unique_ptr<zeph::Run
 Result<std::unique_ptr<Service>> Service::start(RunLoop& mainLoop) {
   OVLog("brivo[zeph]", "{}", "Launching brivo [zeph]");
   Settings settings = Settings::fromEnvironment();
-  auto folder = zeph::RuntimeFolder::claim(
-      settings.runtimeDir, settings.startedByBus ? kPatienceWithLast : std::chrono::seconds(0));
+  auto folder = zeph::RuntimeFolder::claim(settings.runtimeDir,
+                                           settings.startedByBus ? kPatienceWithLast : kPatienceWithKilled);
   if (!folder.ok()) return folder.error();
   std::unique_ptr<Service> service(new Service(mainLoop, std::move(settings), *std::move(folder)));
   service->manager_->startMSDeviceNotifications();  // without it the registry stays empty, nothing more

@@ -243,7 +243,8 @@ TEST(ImagingServiceTest, RandomKillsCostTheirRequestsAtMost) {
       while (!ending) {
         const auto children = childrenOf(::getpid());
         if (!children.empty()) kills += ::kill(children[random() % children.size()], SIGKILL) == 0 ? 1 : 0;
-        std::this_thread::sleep_for(std::chrono::microseconds(random() % 5000));
+        const int next = answers + static_cast<int>(random() % 20);
+        waitUntil([&] { return ending || answers >= next; });
       }
     });
     std::vector<std::thread> callers;

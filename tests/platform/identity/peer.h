@@ -71,7 +71,7 @@ bool enterUserNamespace(int otherKinds);
 /// The same, and goes on as the first process of a process namespace; who called waits outside.
 bool enterProcessNamespace(int otherKinds);
 
-/// A program of its own that runs for a thousand seconds when it is given "1000": a copy of sleep(1).
+/// A program of its own that runs for a thousand seconds when it is given "1000": a copy of /bin/sleep.
 std::string makeProgram(const std::string& path);
 
 }  // namespace brivo::test

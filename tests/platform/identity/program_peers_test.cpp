@@ -135,7 +135,7 @@ TEST_F(ProgramPeersTest, OfTwoDesktopFilesForOneProgramTheUsersComesFirstAndThen
 TEST_F(ProgramPeersTest, AScriptIsKnownByItsInterpreter) {
   const std::string python = fs::canonical("/usr/bin/python3");
   const std::string script = folder / "import-photos";
-  test::writeFile(script, "#!/usr/bin/python3\nimport time\ntime.sleep(1000)\n");
+  test::writeFile(script, "#!/usr/bin/python3\nimport signal\nsignal.pause()\n");
   fs::permissions(script, fs::perms::owner_all);
   install("system", "org.example.Script", script);
   const Peer peer(nullptr, executing(script, {}));
@@ -146,7 +146,7 @@ TEST_F(ProgramPeersTest, AScriptIsKnownByItsInterpreter) {
 TEST_F(ProgramPeersTest, ADesktopFileThatNamesAnInterpreterNamesAllItsScripts) {
   const std::string python = fs::canonical("/usr/bin/python3");
   install("system", "org.example.Script", "/usr/bin/python3 /usr/share/example/script.py");
-  const Peer peer(nullptr, executing(python, {"-c", "import time; time.sleep(1000)"}));
+  const Peer peer(nullptr, executing(python, {"-c", "import signal; signal.pause()"}));
   ASSERT_TRUE(peer.runs(python));
   EXPECT_EQ(identifierOf(peer), "org.example.Script");
 }

@@ -2,6 +2,7 @@
 #include "platform/alerts/alert_board.h"
 
 #include <algorithm>
+#include <chrono>
 #include <utility>
 
 #include "platform/base/uuid.h"
@@ -14,6 +15,9 @@ namespace {
 constexpr int kMostAsked = 10;
 /// More than this does not happen between a question and its answer.
 constexpr std::size_t kMostEarly = 64;
+
+/// Servers answer in milliseconds.
+constexpr std::chrono::seconds kPatienceAtEnd{1};
 
 bool has(const std::vector<std::string>& capabilities, const char* capability) {
   return std::ranges::find(capabilities, capability) != capabilities.end();
@@ -161,8 +165,10 @@ void AlertBoard::dismissAll() {
   }
 }
 
+/// What a server is just being asked to show has no number yet by which it could be taken away.
 void AlertBoard::end() {
   dismissAll();
+  service_.awaitAnswers(kPatienceAtEnd);
   service_.disconnect();
 }
 

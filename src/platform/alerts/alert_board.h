@@ -43,7 +43,7 @@ class AlertBoard : public std::enable_shared_from_this<AlertBoard> {
   void withdraw(const std::shared_ptr<Alert>& alert);
   /// Withdraws every alert as dismissed.
   void dismissAll();
-  /// The same, and leaves the bus.
+  /// The same, and leaves the bus; waits a second at most for a server that is just being asked.
   void end();
 
  private:

@@ -3,8 +3,10 @@
 
 #include <systemd/sd-bus.h>
 
+#include <cerrno>
 #include <memory>
 #include <string_view>
+#include <utility>
 
 namespace brivo {
 
@@ -76,6 +78,19 @@ Result<NotificationService::Place, Failure> placeIn(sd_bus_message* answer) {
 
 }  // namespace
 
+/// From the call to its answer, or to the end of the connection.
+struct NotificationService::Question {
+  Question(NotificationService& owner, Answer handler) : service(owner), onAnswer(std::move(handler)) {
+    ++service.questions_;
+  }
+  ~Question() { --service.questions_; }
+  Question(const Question&) = delete;
+  Question& operator=(const Question&) = delete;
+
+  NotificationService& service;
+  const Answer onAnswer;
+};
+
 /// What libsystemd calls. A message that is not as it should be is no message.
 struct NotificationService::Handlers {
   static int onAction(sd_bus_message* signal, void* userdata, sd_bus_error*) {
@@ -109,7 +124,7 @@ struct NotificationService::Handlers {
   }
 
   static int onAnswer(sd_bus_message* answer, void* userdata, sd_bus_error*) {
-    (*static_cast<Answer*>(userdata))(answer);
+    static_cast<Question*>(userdata)->onAnswer(answer);
     return 0;
   }
 
@@ -127,6 +142,20 @@ void NotificationService::disconnect() {
   if (!bus_) return;
   sd_bus_detach_event(bus_);
   bus_ = sd_bus_close_unref(bus_);
+}
+
+void NotificationService::awaitAnswers(std::chrono::milliseconds limit) {
+  using Clock = std::chrono::steady_clock;
+  const auto end = Clock::now() + limit;
+  while (bus_ && questions_ > 0) {
+    const int processed = sd_bus_process(bus_, nullptr);
+    if (processed < 0) return;
+    if (processed > 0) continue;
+    const auto left = std::chrono::duration_cast<std::chrono::microseconds>(end - Clock::now()).count();
+    if (left <= 0) return;
+    const int waited = sd_bus_wait(bus_, static_cast<std::uint64_t>(left));
+    if (waited < 0 && waited != -EINTR) return;
+  }
 }
 
 int NotificationService::open() {
@@ -156,13 +185,13 @@ int NotificationService::listen() {
 }
 
 void NotificationService::call(sd_bus_message* message, Answer onAnswer) {
-  auto handler = std::make_unique<Answer>(std::move(onAnswer));
+  auto question = std::make_unique<Question>(*this, std::move(onAnswer));
   sd_bus_slot* slot = nullptr;
-  if (sd_bus_call_async(bus_, &slot, message, Handlers::onAnswer, handler.get(), kNoLimit) < 0) {
-    return (*handler)(nullptr);
+  if (sd_bus_call_async(bus_, &slot, message, Handlers::onAnswer, question.get(), kNoLimit) < 0) {
+    return question->onAnswer(nullptr);
   }
-  sd_bus_slot_set_destroy_callback(slot, [](void* userdata) { delete static_cast<Answer*>(userdata); });
-  (void)handler.release();
+  sd_bus_slot_set_destroy_callback(slot, [](void* userdata) { delete static_cast<Question*>(userdata); });
+  (void)question.release();
   sd_bus_slot_set_floating(slot, 1);
   sd_bus_slot_unref(slot);
 }

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <string>
@@ -55,6 +57,9 @@ class NotificationService {
   /// Connects when that has not been done. False when there is no session bus.
   bool connect();
   void disconnect();
+  /// Waits until what was asked has been answered, and calls the handlers; `limit` at most. On the loop's
+  /// thread, or when the loop does not run any more; not from a handler.
+  void awaitAnswers(std::chrono::milliseconds limit);
 
   /// What the server can do.
   void askCapabilities(const Handler<std::vector<std::string>>& onAnswer);
@@ -68,6 +73,7 @@ class NotificationService {
   using Answer = std::function<void(sd_bus_message* answer)>;
 
   struct Handlers;
+  struct Question;
 
   int open();
   int listen();
@@ -76,6 +82,7 @@ class NotificationService {
   RunLoop& loop_;
   const Events events_;
   sd_bus* bus_ = nullptr;
+  std::size_t questions_ = 0;  // that have no answer yet
 };
 
 }  // namespace brivo

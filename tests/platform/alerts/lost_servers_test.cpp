@@ -104,6 +104,16 @@ TEST_F(SlowServerTest, TheNextOneIsAskedWhenItHangsUp) {
   EXPECT_EQ(alert->waitForResponse(), UserAlert::defaultButton);
 }
 
+TEST_F(SlowServerTest, WhatItAnswersWhileAllEndsIsTakenFromItsScreen) {
+  onLoop([&] { alerts->dismissAll(); });
+  EXPECT_EQ(showing.get(), nullptr);
+  endLoop();
+  auto ending = std::async(std::launch::async, [this] { alerts.reset(); });
+  slow->answerAll();
+  ending.get();
+  EXPECT_TRUE(waitUntil([&] { return slow->withdrawn().size() == 1; }));
+}
+
 class LostServerTest : public test::AlertsTest {
  protected:
   void SetUp() override {

@@ -41,8 +41,9 @@ class SessionBus:
 
 
 class Notification:
-    def __init__(self, number, arguments):
+    def __init__(self, number, client, arguments):
         self.number = number
+        self.client = client
         _, _, _, self.title, self.body, actions, _, _ = arguments
         self.keys = dict(zip(actions[1::2], actions[0::2]))
 
@@ -81,13 +82,13 @@ class NotificationServer:
             self._bus.close_sync(None)
         self._context.pop_thread_default()
 
-    def _on_call(self, _bus, _sender, _path, _interface, method, arguments, call):
+    def _on_call(self, _bus, sender, _path, _interface, method, arguments, call):
         if method == "GetCapabilities":
             call.return_value(GLib.Variant("(as)", (self.capabilities,)))
         elif method == "Notify":
-            notification = Notification(len(self.shown) + 1, arguments.unpack())
-            self.shown.append(notification)
+            notification = Notification(len(self.shown) + 1, sender, arguments.unpack())
             call.return_value(GLib.Variant("(u)", (notification.number,)))
+            self.shown.append(notification)
             if self.answer:
                 self.answer(self, notification)
         else:
@@ -104,7 +105,10 @@ class NotificationServer:
         self._signal("NotificationClosed", GLib.Variant("(uu)", (notification.number, 2)))
 
     def wait_for_shown(self):
-        return wait_until(lambda: self.shown and self.shown[-1], "a notification")
+        """The last notification, when who asked for it knows that it is there."""
+        notification = wait_until(lambda: self.shown and self.shown[-1], "a notification")
+        self._bus.call_sync(notification.client, "/", "org.freedesktop.DBus.Peer", "Ping", None, None, 0, WAIT * 1000, None)
+        return notification
 
     def close(self):
         """Ends it, after what it has answered has gone out."""

@@ -40,7 +40,7 @@ void BrivoFile::thumbnailDataWithOptions(const Dictionary& options, const Result
 
 std::optional<Data> BrivoFile::thumbnailDataForPixelWidth(std::uint32_t width) {
   startBenchmark();
-  const std::optional<Data> data =
+  std::optional<Data> data =
       type() == kTypeImage ? imageThumbnailDataForPixelWidth(width) : movieThumbnailDataForPixelWidth(width);
   const std::string response =
       fmt::format("[subImage] {:>10}: [{:>10}b]", "response", data ? data->size() : 0);

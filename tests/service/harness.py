@@ -347,23 +347,23 @@ class Dataset:
 
 
 class LoopCard:
-    """A file system in an image file, mounted where the service looks for volumes."""
+    """A file system in an image file, mounted where the service looks for volumes. An ext4 can have files of a folder
+    before it is mounted for the first time."""
 
-    def __init__(self, service, name, kind="ext4", megabytes=32):
+    def __init__(self, service, name, kind="ext4", megabytes=32, content=None, options="rw"):
         self.point = f"{service.mounts}/{name}"
         self.image = f"{service.folder}/{name}.image"
         os.mkdir(self.point)
         run("truncate", "-s", f"{megabytes}M", self.image)
-        run(f"mkfs.{kind}", *(["-q"] if kind == "ext4" else []), self.image)
+        run(f"mkfs.{kind}", *(["-q"] if kind == "ext4" else []), *(["-d", content] if content else []), self.image)
         self.loop = run("losetup", "-f", "--show", self.image).strip()
         self.kind = kind
+        self.options = options
         self.mount()
 
     def mount(self):
-        if self.kind == "exfat":
-            run("mount.exfat-fuse", self.loop, self.point)
-        else:
-            run("mount", self.loop, self.point)
+        program = "mount.exfat-fuse" if self.kind == "exfat" else "mount"
+        run(program, "-o", self.options, self.loop, self.point)
 
     def unmount(self):
         run("umount", self.point)

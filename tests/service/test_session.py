@@ -142,7 +142,6 @@ class MountedCardTest(SessionTest):
         card.mount()
         again = manager.wait_for_device(card.point)
         self.assertNotEqual(again["OVDeviceHandle"], device.handle)
-        card.unmount()
 
     @needs_root
     def test_a_session_on_ext4(self):
@@ -156,11 +155,10 @@ class MountedCardTest(SessionTest):
 
     @needs_root
     def test_a_card_mounted_read_only_is_locked_and_deletes_nothing(self):
-        card = LoopCard(self.service, "LOCKED")
+        content = f"{self.service.folder}/content"
+        make_card(content, {"100ABCDE/IMG_0001.JPG": b"x"})
+        card = LoopCard(self.service, "LOCKED", content=content, options="ro")
         self.addCleanup(card.close)
-        make_card(card.point, {"100ABCDE/IMG_0001.JPG": b"x"})
-        card.unmount()
-        os.system(f"mount -o ro {card.loop} {card.point}")
         device = self.device(self.manager(), card.point)
         self.assertEqual(device.properties["OVDeviceLocked"], 1)
         device.enumerate()

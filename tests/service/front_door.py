@@ -54,8 +54,13 @@ class SessionBus:
             self.process = subprocess.Popen(
                 [*self.prefix, "dbus-daemon", "--nofork", f"--config-file={self.folder}/configuration"],
                 env=self.environment, stdin=subprocess.DEVNULL, stdout=log, stderr=log)
-        wait_until(lambda: os.path.exists(self.path) or self.process.poll() is not None, "the message bus")
+        wait_until(lambda: self.listens() or self.process.poll() is not None, "the message bus")
         assert self.process.poll() is None, self.log()
+
+    def listens(self):
+        """Its socket has a name a moment before it can be connected to."""
+        with socket.socket(socket.AF_UNIX) as probe:
+            return probe.connect_ex(self.path) == 0
 
     def stop(self):
         if self.process is not None:

@@ -363,7 +363,7 @@ class LoopCard:
 
     def mount(self):
         program = "mount.exfat-fuse" if self.kind == "exfat" else "mount"
-        run(program, "-o", self.options, self.loop, self.point)
+        run(program, self.loop, self.point, "-o", self.options)
 
     def unmount(self):
         run("umount", self.point)

@@ -37,13 +37,15 @@ AccessDatabase::~AccessDatabase() {
 }
 
 void AccessDatabase::open() {
-  if (const auto error = makePrivateFolder(folder_)) OVLogError(kTag, "{}", error->text());
+  const auto folderFailure = makePrivateFolder(folder_);
   auto opened = Database::open(appendingPathComponent(folder_, "externalMediaAccess.db"));
-  if (!opened.ok()) {
-    OVLogError(kTag, "Failed to open/create database");
-    OVLogError(kTag, "{}", opened.error().text());
-    return;
-  }
+  const std::string failure = folderFailure ? folderFailure->text()
+                              : opened.ok() ? std::string()
+                                            : opened.error().text();
+  if (!opened.ok() && failure != openFailure_) OVLogError(kTag, "Failed to open/create database");
+  if (!failure.empty() && failure != openFailure_) OVLogError(kTag, "{}", failure);
+  openFailure_ = failure;
+  if (!opened.ok()) return;
   database_ = *std::move(opened);
   createTables();
 }
@@ -63,20 +65,31 @@ void AccessDatabase::createTables() {
 }
 
 void AccessDatabase::reopenIfLost() {
-  if (!database_ || !database_->hasLostItsFile()) return;
-  OVLogError(kTag, "The database is not where it was, opening it anew");
+  if (database_ && !database_->hasLostItsFile()) return;
+  if (database_) OVLogError(kTag, "The database is not where it was, opening it anew");
   database_.reset();
   open();
+}
+
+std::optional<std::string> AccessDatabase::run(const std::string& statement,
+                                               std::initializer_list<Database::Binding> bindings,
+                                               const Database::RowHandler& onRow) {
+  std::optional<std::string> failure;
+  deviceAccessQueue_->runAndWait([&] {
+    reopenIfLost();
+    failure = database_ ? database_->execute(statement, bindings, onRow) : "no database";
+  });
+  return failure;
 }
 
 void AccessDatabase::execute(const char* tag, const std::string& statement,
                              std::initializer_list<Database::Binding> bindings,
                              const Database::RowHandler& onRow) {
-  deviceAccessQueue_->runAndWait([&] {
-    reopenIfLost();
-    if (!database_) return OVLogError(tag, "no database");
-    if (const auto failure = database_->execute(statement, bindings, onRow)) OVLogError(tag, "{}", *failure);
-  });
+  if (const auto failure = run(statement, bindings, onRow)) OVLogError(tag, "{}", *failure);
+}
+
+std::optional<std::string> AccessDatabase::whyUnreadable(Table table) {
+  return run(std::string("SELECT bundle_id FROM ") + nameOf(table) + " LIMIT 1;");
 }
 
 std::vector<std::string> AccessDatabase::list(const char* tag, const std::string& statement) {

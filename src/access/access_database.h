@@ -3,6 +3,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -20,8 +21,8 @@ class AccessDatabase {
   enum class Table { access, control };
 
   /// Opens or makes "externalMediaAccess.db" in `folder`, which is made when missing (not those above it),
-  /// and brings an old file up to date. Without a usable file every operation finds nothing. A file that is
-  /// removed or replaced later is opened, or made, anew.
+  /// and brings an old file up to date. Without a usable file every operation finds nothing, after it has
+  /// tried again to open one. A file that is removed or replaced later is opened, or made, anew.
   AccessDatabase(Pool& pool, std::string folder);
   ~AccessDatabase();
   AccessDatabase(const AccessDatabase&) = delete;
@@ -44,12 +45,18 @@ class AccessDatabase {
   /// The rows of one application: "bundle_id", "date_added" (seconds since 1970) and "whitelisted" where not
   /// NULL.
   std::vector<Dictionary> rowsOf(const std::string& bundleIdentifier, Table table);
+  /// The engine's message when the grants of a kind cannot be read, so that none being found means nothing.
+  std::optional<std::string> whyUnreadable(Table table);
 
  private:
   void open();
   void createTables();
   void reopenIfLost();
-  /// Runs one statement on the queue; what fails is logged under `tag`.
+  /// Runs one statement on the queue: why it failed.
+  std::optional<std::string> run(const std::string& statement,
+                                 std::initializer_list<Database::Binding> bindings = {},
+                                 const Database::RowHandler& onRow = nullptr);
+  /// The same; what fails is logged under `tag`.
   void execute(const char* tag, const std::string& statement,
                std::initializer_list<Database::Binding> bindings = {},
                const Database::RowHandler& onRow = nullptr);
@@ -57,7 +64,9 @@ class AccessDatabase {
 
   const std::string folder_;
   const std::shared_ptr<SerialQueue> deviceAccessQueue_;
-  std::unique_ptr<Database> database_;  // on the queue only; null when it could not be opened
+  // On the queue only.
+  std::unique_ptr<Database> database_;  // null when it could not be opened
+  std::string openFailure_;             // what was wrong last time, to be told once
 };
 
 // One result row as the operations above return it.

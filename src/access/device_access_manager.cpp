@@ -30,12 +30,14 @@ bool OVDeviceAccessManager::validateBundleIdentifierInstalled(const std::string&
   using Table = AccessDatabase::Table;
   const auto rows = database_.rowsOf(bundleIdentifier, control ? Table::control : Table::access);
   const auto matches = [&](const Dictionary& row) { return isFor(row, bundleIdentifier); };
-  if (applications_.isInstalled(bundleIdentifier) && std::ranges::any_of(rows, matches)) return true;
+  const bool installed = applications_.isInstalled(bundleIdentifier);
+  if (installed && std::ranges::any_of(rows, matches)) return true;
   if (bundleIdentifier.find(kVendorPrefix) != std::string::npos) return true;
   OVLogError("ovaccess",
              "Bundle was not found to be installed on the device, revoking access defensively to require the "
              "user to "
              "re-authorize upon install.");
+  if (installed) return false;  // no row: to delete none could only hit one that was stored since the look
   if (control) {
     database_.revokeControlApplicationWithBundleIdentifier(bundleIdentifier);
   } else {

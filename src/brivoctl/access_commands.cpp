@@ -28,8 +28,15 @@ std::unique_ptr<Grants> grantsIn(AccessFile& file, bool control) {
   return std::make_unique<AccessGrants>(file.database());
 }
 
+using Table = brivo::AccessDatabase::Table;
+
+std::optional<std::string> whyUnreadable(AccessFile& file, bool control) {
+  return file.database().whyUnreadable(control ? Table::control : Table::access);
+}
+
 ExitCode listGrants(const CommonOptions& common, const AccessOptions& options) {
   AccessFile file;
+  if (const auto why = whyUnreadable(file, options.control)) return cannotRead(file, *why);
   const auto grants = grantsIn(file, options.control)->list();
   if (common.json) {
     Json list = Json::array();
@@ -57,6 +64,7 @@ ExitCode grant(const CommonOptions& common, const AccessOptions& options) {
 
 ExitCode revoke(const CommonOptions& common, const AccessOptions& options) {
   AccessFile file;
+  if (const auto why = whyUnreadable(file, options.control)) return cannotRead(file, *why);
   const auto grants = grantsIn(file, options.control);
   if (!grants->isKnown(options.identifier)) return fail(shown(options.identifier) + " has no grant");
   grants->revoke(options.identifier);

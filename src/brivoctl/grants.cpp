@@ -29,6 +29,10 @@ ExitCode cannotStore(const AccessFile& file) {
               " cannot be written; BRIVOD_DEBUG=1 brivoctl says why");
 }
 
+ExitCode cannotRead(const AccessFile& file, const std::string& why) {
+  return fail("the access database in " + shown(file.folder()) + " cannot be read: " + shown(why));
+}
+
 bool Grants::isKnown(const std::string& identifier) {
   return std::ranges::any_of(list(), [&](const Grant& grant) { return grant.identifier == identifier; });
 }

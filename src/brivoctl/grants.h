@@ -27,6 +27,8 @@ class AccessFile {
 
 /// Says that a grant could not be stored there.
 ExitCode cannotStore(const AccessFile& file);
+/// Says that the grants there could not be read, and why.
+ExitCode cannotRead(const AccessFile& file, const std::string& why);
 
 struct Grant {
   std::string identifier;

@@ -93,6 +93,21 @@ TEST_F(DatabaseFaultsTest, AFolderThatCannotBeMadeIsLoggedAndNothingIsGranted) {
   EXPECT_EQ(test::readFile(folder()), "in the way");
 }
 
+TEST_F(DatabaseFaultsTest, AFolderThatCannotBeMadeIsTriedAgainAndToldOnce) {
+  test::writeFile(folder(), "in the way");
+  const test::StandardErrorCapture log;
+  const auto database = open();
+  EXPECT_THAT(database->whyUnreadable(Table::access), testing::Optional(HasSubstr("no database")));
+  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), IsEmpty());
+  const std::string told = log.text();
+  const auto failed = told.find("Failed to open/create database");
+  EXPECT_EQ(told.find("Failed to open/create database", failed + 1), std::string::npos) << told;
+  fs::remove(folder());
+  database->addApplicationWithBundleIdentifier("org.example.App", true);
+  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
+  EXPECT_EQ(database->whyUnreadable(Table::control), std::nullopt);
+}
+
 TEST_F(DatabaseFaultsTest, AFileThatIsNoDatabaseIsToldAndNotDestroyed) {
   test::writeFile(file(), std::string(10'000, 'x'));
   const test::StandardErrorCapture log;

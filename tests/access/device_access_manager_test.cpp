@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <functional>
 #include <set>
 #include <thread>
 
@@ -24,10 +25,14 @@ using testing::IsEmpty;
 
 class Applications : public InstalledApplications {
  public:
-  bool isInstalled(const std::string& identifier) const override { return installed.contains(identifier); }
+  bool isInstalled(const std::string& identifier) const override {
+    meanwhile();
+    return installed.contains(identifier);
+  }
   std::optional<std::string> identifierOfProgram(dev_t, ino_t) const override { return std::nullopt; }
 
   std::set<std::string> installed;
+  std::function<void()> meanwhile = [] {};  ///< what others do after the grants were looked at
 };
 
 /// Answers every alert with the same button.
@@ -128,6 +133,26 @@ TEST_F(DeviceAccessManagerTest, AnInstalledApplicationWithoutARowIsNotValidEithe
   database.addApplicationWithBundleIdentifier(app, true);
   EXPECT_TRUE(manager.validateBundleIdentifierInstalled(app, false));
   EXPECT_FALSE(manager.validateBundleIdentifierInstalled(app, true));
+}
+
+TEST_F(DeviceAccessManagerTest, AGrantThatIsStoredWhileOneIsLookedForStays) {
+  applications.installed = {app};
+  applications.meanwhile = [&] { database.addApplicationWithBundleIdentifier(app, true); };
+  EXPECT_FALSE(manager.validateBundleIdentifierInstalled(app, false));
+  EXPECT_THAT(database.bundleIdentifiersAccessingExternalCameras(), ElementsAre(app));
+  applications.meanwhile = [&] { database.addControlApplicationWithBundleIdentifier(app, true); };
+  EXPECT_FALSE(manager.validateBundleIdentifierInstalled(app, true));
+  EXPECT_THAT(database.bundleIdentifiersControllingExternalCameras(), ElementsAre(app));
+}
+
+TEST_F(DeviceAccessManagerTest, AGrantThatCannotBeReadForAWhileStays) {
+  applications.installed = {app};
+  database.addApplicationWithBundleIdentifier(app, true);
+  auto other = *Database::open(home / "data/externalMediaAccess.db");
+  ASSERT_EQ(other->execute("BEGIN EXCLUSIVE"), std::nullopt);
+  applications.meanwhile = [&] { EXPECT_EQ(other->execute("ROLLBACK"), std::nullopt); };
+  EXPECT_FALSE(manager.validateBundleIdentifierInstalled(app, false)) << "nobody knows";
+  EXPECT_THAT(database.bundleIdentifiersAccessingExternalCameras(), ElementsAre(app));
 }
 
 TEST_F(DeviceAccessManagerTest, WithoutAGrantAndWithoutAnAlertAccessIsRefused) {

@@ -19,6 +19,7 @@ trap cleanup EXIT
 
 export HOME=$work/home BRIVOD_RUNTIME_DIR=$work/run BRIVOD_VOLUME_FOLDERS=$work/volumes BRIVOD_VOLUME_ROOTS=$work/mounts
 export XDG_DATA_HOME=$work/data XDG_CONFIG_HOME=$work/config
+unset XDG_RUNTIME_DIR DBUS_SESSION_BUS_ADDRESS  # the session's name is for the user's own service
 export PATH=$prefix/bin:$PATH
 if [ "$prefix" != /usr ]; then
   export XDG_DATA_DIRS=$prefix/share LD_LIBRARY_PATH=$prefix/$libdir PKG_CONFIG_PATH=$prefix/$libdir/pkgconfig

@@ -9,7 +9,7 @@ import sys
 
 from gi.repository import GLib
 import reading
-from harness import Device, Manager, connect_raw, wait_until
+from harness import Device, Manager, connect_raw, hung_up, wait_until
 
 
 class Client:
@@ -33,7 +33,9 @@ class Client:
         try:
             self.open(path)
             return True
-        except GLib.Error:
+        except GLib.Error as error:
+            if not hung_up(error):
+                raise
             return False
 
     def device_count(self):

@@ -324,6 +324,12 @@ class Device(Connection):
         return wait_until(arrived, f"datasets {names}")
 
 
+def hung_up(error):
+    """Whether the peer ended the connection, which is how one is refused."""
+    ends = (Gio.IOErrorEnum.CLOSED, Gio.IOErrorEnum.CONNECTION_CLOSED)
+    return any(error.matches(Gio.io_error_quark(), end) for end in ends)
+
+
 def variants(options):
     plain = {bool: "b", str: "s", float: "d"}
     return {name: value if isinstance(value, GLib.Variant)

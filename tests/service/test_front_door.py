@@ -2,6 +2,7 @@
 """The service's name on the session bus: for clients that can reach the bus and not the sockets."""
 import json
 import os
+import re
 import shutil
 import signal
 import subprocess
@@ -11,7 +12,7 @@ from gi.repository import Gio, GLib
 from front_door import DOOR, LIMITS_EXCEEDED, NAME, UNKNOWN_DEVICE, SessionBus, WithoutDescriptors, device_list
 from front_door import error_name, knock, open_device, open_manager, read_all, wait_for_file
 from harness import BRIVOD, BUILD, IS_ROOT, PATH, PYTHON, WAIT, Service, ServiceTest, needs, needs_root
-from harness import wait_until
+from harness import hung_up, wait_until
 
 CLIENT = os.path.join(os.path.dirname(os.path.abspath(__file__)), "door_client.py")
 NOBODY = 65534
@@ -138,8 +139,9 @@ class IdentityTest(FrontDoorTest):
         self.service.grant(PYTHON)
         device = self.device(self.manager(), f"{self.service.volumes}/CARD")
         bus = self.connect()
-        with self.assertRaises(GLib.Error):
+        with self.assertRaises(GLib.Error) as raised:
             open_device(bus, self.handle).call("requestStartUsingDeviceWithReply")
+        self.assertTrue(hung_up(raised.exception), raised.exception)
         self.assertEqual(device.start_using()["OVDeviceName"], "CARD")
 
     def test_a_client_that_sees_nothing_but_the_bus_lists_the_devices_and_reads_a_file(self):
@@ -182,7 +184,8 @@ class CrowdTest(FrontDoorTest):
         try:
             os.close(knock(bus, "OpenManager")[0])
             return False
-        except GLib.Error:
+        except GLib.Error as error:
+            self.assertEqual(error_name(error), LIMITS_EXCEEDED)
             return True
 
     def test_thousands_of_calls_at_once_are_all_answered(self):
@@ -230,9 +233,10 @@ class BusTest(FrontDoorTest):
     def test_the_door_opens_again_when_the_bus_has_been_away(self):
         manager = self.manager_at_the_door()
         for _ in range(2):
+            before = len(self.service.log())
             self.bus.stop()
-            wait_until(lambda: self.service.log().rstrip().endswith("the session bus has gone") or
-                       "no session bus" in self.service.log(), "the service to notice")
+            wait_until(lambda b=before: re.search("the session bus has gone|no session bus", self.service.log()[b:]),
+                       "the service to notice")
             self.assertEqual(self.manager().devices(), [])
             self.bus.start()
             self.wait_for_the_door()
@@ -265,11 +269,13 @@ class BusTest(FrontDoorTest):
 
 class WithoutBusTest(unittest.TestCase):
     def lines_with(self, **environment):
+        """All that a service says of the door until it ends."""
         service = Service(**environment)
         self.addCleanup(service.close)
-        lines = wait_until(lambda: [line for line in service.log().splitlines() if "frontDoor" in line], "the line")
+        wait_until(lambda: "frontDoor" in service.log(), "the line")
         self.assertEqual(service.brivoctl("devices").returncode, 0)
-        return lines
+        self.assertEqual(service.stop(), 0)
+        return [line for line in service.log().splitlines() if "frontDoor" in line]
 
     def test_without_a_bus_it_says_so_once(self):
         self.assertEqual(self.lines_with(), ["<5>           frontDoor | there is no session bus"])
@@ -282,6 +288,7 @@ class WithoutBusTest(unittest.TestCase):
         wait_until(lambda: "no session bus" in service.log(), "the line")
         bus.start()
         wait_until(bus.has_owner, "the name, when the bus has come")
+        self.assertEqual(service.stop(), 0)
         self.assertEqual(service.log().count("no session bus"), 1)
 
     def test_an_address_that_is_none_does_no_harm(self):

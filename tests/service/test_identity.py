@@ -151,7 +151,7 @@ class ProcessNamespaceTest(IdentityTest):
         client = self.inside()
         client.ask("device_count")  # it is connected by now
         for _ in range(5):
-            with self.assertRaises(AssertionError):
+            with self.assertRaisesRegex(AssertionError, "g-io-error-quark"):
                 self.other_client().ask("device_count")
         self.assertEqual(client.ask("device_count"), 1)
         self.assertTrue(client.ask("is_let_in", self.path))

@@ -1,6 +1,7 @@
 # SPDX-License-Identifier: MIT
 """A systemd of the test's own that manages a user's services, and the message bus that it starts: in namespaces, so
 that nothing outside sees them and they end with the test."""
+import contextlib
 import os
 import pwd
 import shutil
@@ -32,9 +33,9 @@ find /sys/fs/cgroup/$GROUP -depth -type d -exec rmdir {} +
 
 
 class UserManager:
-    """systemd --user, with the units of the build tree."""
+    """systemd --user, with the units of the build tree from the beginning or as soon as they are installed."""
 
-    def __init__(self, account, idle_seconds):
+    def __init__(self, account, idle_seconds, installed=True):
         self.account = pwd.getpwnam(account)
         self.folder = os.path.realpath(tempfile.mkdtemp(prefix="brivod-user-"))
         self.volumes = f"{self.folder}/volumes"
@@ -47,8 +48,8 @@ class UserManager:
             "PATH": os.environ["PATH"],
             "HOME": self.folder,
             "XDG_RUNTIME_DIR": self.runtime,
-            "XDG_DATA_DIRS": f"{BUILD}/share",
-            "SYSTEMD_GENERATOR_PATH": f"{BUILD}/lib/systemd/user-generators",
+            "XDG_DATA_DIRS": f"{self.folder}/installed/share",
+            "SYSTEMD_GENERATOR_PATH": f"{self.folder}/installed/lib/systemd/user-generators",
             "DBUS_SESSION_BUS_ADDRESS": self.bus_address,
             "BRIVOD_VOLUME_FOLDERS": self.volumes,
             "BRIVOD_VOLUME_ROOTS": self.mounts,
@@ -62,7 +63,12 @@ class UserManager:
             os.mkdir(path)
         os.chmod(self.runtime, 0o700)
         self._write_settings()
+        if installed:
+            self.install()
         self.process = None
+
+    def install(self):
+        os.symlink(BUILD, f"{self.folder}/installed")
 
     def _write_settings(self):
         """The log goes to a file, and a service that comes and goes all the time is no failure."""
@@ -110,14 +116,18 @@ class UserManager:
         return self.run("systemctl", "--user", "show", "--value", f"--property={what}", unit).stdout.strip()
 
     def log(self):
-        with open(self.log_path, encoding="utf-8", errors="replace") as log:
+        """What the service has said; nothing before its first start."""
+        with contextlib.suppress(FileNotFoundError), open(self.log_path, encoding="utf-8", errors="replace") as log:
             return log.read()
+        return ""
 
     def close(self):
         if self.process is not None:
+            ran = self.process.poll() is None
             self.process.kill()
             self.process.wait(WAIT)
-            wait_until(self._has_left_nothing, "all of its processes to end")
+            if ran:
+                wait_until(self._has_left_nothing, "all of its processes to end")
         shutil.rmtree(self.folder, ignore_errors=True)
 
     def _has_left_nothing(self):

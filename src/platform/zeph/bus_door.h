@@ -13,7 +13,8 @@
 namespace brivo::zeph {
 
 /// Keeps the door on the session bus: connects, takes the name, and comes back when the bus does. Another
-/// owner of the name is waited for, and so is a bus that is not there. *Thread-bound* to the I/O thread.
+/// owner of the name is waited for, and so is a bus that has an address and is not there. *Thread-bound* to
+/// the I/O thread.
 class BusDoor : public std::enable_shared_from_this<BusDoor> {
  public:
   static constexpr std::chrono::milliseconds kFirstRetry{500};

@@ -4,12 +4,14 @@
 #include <map>
 #include <vector>
 
+#include "platform/applications/file_stamp.h"
 #include "platform/applications/installed_applications.h"
 #include "platform/base/mutex.h"
 
 namespace brivo {
 
-/// The desktop files of this machine, read again when one of them or of their folders has changed.
+/// The desktop files of this machine, read again when one of them or of their folders has changed, and until
+/// nothing of them failed to be read. What could not be read is as it was when it last could.
 class DesktopCatalogue final : public InstalledApplications {
  public:
   /// `userDataDir` is the user's own data folder, `dataDirs` the system's. An id that begins with
@@ -22,16 +24,24 @@ class DesktopCatalogue final : public InstalledApplications {
 
  private:
   struct Application {
+    std::string file;
     std::string identifier;
-    std::string program;  ///< absolute path, empty when it was not found
+    std::string program;  ///< a path or a name to be looked up; empty when its file was never read
   };
-  /// When a file or folder was last changed, in nanoseconds since 1970; -1 when it is not there.
-  using ChangeTimes = std::map<std::string, std::int64_t>;
+  struct Reading {
+    std::vector<Application> applications;    // by precedence
+    std::map<std::string, FileStamp> stamps;  // of all files and folders, from before they were read
+    bool hasAllFolders = true;
+    bool hasAllFiles = true;
+  };
 
   void refresh() const BRIVO_REQUIRES(mutex_);
-  void readFolder(const std::string& folder, const std::string& prefix, bool ofUser) const
+  void readFolder(Reading& reading, const std::string& folder, const std::string& prefix, bool ofUser) const
       BRIVO_REQUIRES(mutex_);
-  void readFile(const std::string& path, const std::string& identifier, bool ofUser) const
+  void readFile(Reading& reading, const std::string& path, const std::string& identifier, bool ofUser) const
+      BRIVO_REQUIRES(mutex_);
+  void keepFolder(Reading& reading, const std::string& folder) const BRIVO_REQUIRES(mutex_);
+  void keepFile(Reading& reading, const std::string& path, const std::string& identifier) const
       BRIVO_REQUIRES(mutex_);
 
   const std::string userDataDir_;
@@ -39,9 +49,8 @@ class DesktopCatalogue final : public InstalledApplications {
   const std::string vendorPrefix_;
 
   mutable Mutex mutex_;
-  mutable std::vector<Application> applications_ BRIVO_GUARDED_BY(mutex_);  // by precedence
-  mutable ChangeTimes times_ BRIVO_GUARDED_BY(mutex_);
-  mutable bool settled_ BRIVO_GUARDED_BY(mutex_) = false;  // nothing had changed just before it was read
+  mutable Reading reading_ BRIVO_GUARDED_BY(mutex_);
+  mutable bool settled_ BRIVO_GUARDED_BY(mutex_) = false;  // all was read, and not just after it had changed
 };
 
 }  // namespace brivo

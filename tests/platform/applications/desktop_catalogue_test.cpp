@@ -4,10 +4,13 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
+#include <chrono>
 #include <filesystem>
 
+#include "support/descriptor_limit.h"
 #include "support/environment.h"
 #include "support/temporary_folder.h"
+#include "support/wait.h"
 
 namespace brivo {
 namespace {
@@ -28,6 +31,17 @@ class DesktopCatalogueTest : public testing::Test {
     struct stat status {};
     EXPECT_EQ(::stat(program.c_str(), &status), 0);
     return catalogue.identifierOfProgram(status.st_dev, status.st_ino);
+  }
+  /// Waits until what was installed so far is too old to be read again for that alone.
+  void waitUntilOld() {
+    test::writeFile(folder / "last", "");
+    const auto time = std::filesystem::last_write_time(folder / "last") + std::chrono::milliseconds(2100);
+    ASSERT_TRUE(test::waitUntil([&] { return std::filesystem::file_time_type::clock::now() > time; }));
+  }
+  /// From here on what was installed is read again only when it changes.
+  void settle() {
+    waitUntilOld();
+    EXPECT_FALSE(catalogue.isInstalled("anything"));
   }
 
   test::TemporaryFolder folder;
@@ -85,15 +99,95 @@ TEST_F(DesktopCatalogueTest, ChangesAreSeen) {
 TEST_F(DesktopCatalogueTest, AFileThatIsWrittenAnewInItsPlaceIsReadAgain) {
   const std::string first = makeProgram("first");
   const std::string second = makeProgram("second");
-  const std::string file = folder / "system/applications/a.desktop";
-  const auto longAgo = std::filesystem::file_time_type::clock::now() - std::chrono::hours(1);
   install("system", "a.desktop", first);
-  std::filesystem::last_write_time(file, longAgo);
-  std::filesystem::last_write_time(folder / "system/applications", longAgo);
+  settle();
   EXPECT_EQ(identifierOf(first), "a");
   install("system", "a.desktop", second);
   EXPECT_EQ(identifierOf(first), std::nullopt);
   EXPECT_EQ(identifierOf(second), "a");
+}
+
+TEST_F(DesktopCatalogueTest, AFileThatIsChangedWithoutItsTimeIsReadAgain) {
+  const std::string program = makeProgram("photos");
+  const std::string file = folder / "system/applications/a.desktop";
+  install("system", "a.desktop", folder / "bin/none");
+  const auto time = std::filesystem::last_write_time(file);
+  settle();
+  install("system", "a.desktop", program);
+  std::filesystem::last_write_time(file, time);
+  EXPECT_EQ(identifierOf(program), "a");
+}
+
+TEST_F(DesktopCatalogueTest, AProgramThatComesIntoThePathLaterIsFound) {
+  const test::ScopedVariable path("PATH", (folder / "early") + ":" + (folder / "bin"));
+  install("system", "a.desktop", "photos");
+  settle();
+  const std::string program = makeProgram("photos");
+  EXPECT_EQ(identifierOf(program), "a");
+  std::filesystem::create_directory(folder / "early");
+  std::filesystem::copy_file(program, folder / "early/photos");
+  EXPECT_EQ(identifierOf(folder / "early/photos"), "a");
+  EXPECT_EQ(identifierOf(program), std::nullopt) << "it is no longer what the name means";
+}
+
+TEST_F(DesktopCatalogueTest, WithoutDescriptorsTheFoldersAreAsTheyWere) {
+  const std::string program = makeProgram("photos");
+  install("user", "a.desktop", program);
+  install("system", "vendor/b.desktop", folder / "bin/other");
+  ASSERT_TRUE(catalogue.isInstalled("a"));
+  for (const rlim_t spare : {0, 1, 2}) {
+    const test::DescriptorLimit limit(spare);
+    EXPECT_TRUE(catalogue.isInstalled("a")) << spare;
+    EXPECT_TRUE(catalogue.isInstalled("vendor-b")) << spare;
+    EXPECT_EQ(identifierOf(program), "a") << spare;
+  }
+}
+
+TEST_F(DesktopCatalogueTest, WhatWasNeverListedMayBeInstalled) {
+  install("system", "a.desktop", makeProgram("photos"));
+  {
+    const test::DescriptorLimit limit(0);
+    EXPECT_TRUE(catalogue.isInstalled("a"));
+  }
+  EXPECT_TRUE(catalogue.isInstalled("a"));
+  EXPECT_FALSE(catalogue.isInstalled("b"));
+}
+
+TEST_F(DesktopCatalogueTest, AReadingThatFailedIsMadeUpForThoughNothingChanges) {
+  const std::string program = makeProgram("photos");
+  install("system", "a.desktop", program);
+  waitUntilOld();
+  {
+    const test::DescriptorLimit limit(0);
+    catalogue.isInstalled("a");
+  }
+  EXPECT_EQ(identifierOf(program), "a");
+}
+
+/// A regular file that cannot be read by anybody: what follows is an I/O error.
+constexpr const char* kUnreadable = "/proc/self/mem";
+
+TEST_F(DesktopCatalogueTest, AFileThatCannotBeReadIsAsItWasAndTheOthersAreRead) {
+  const std::string program = makeProgram("photos");
+  const std::string other = makeProgram("other");
+  install("system", "a.desktop", program);
+  ASSERT_EQ(identifierOf(program), "a");
+  std::filesystem::remove(folder / "system/applications/a.desktop");
+  std::filesystem::create_symlink(kUnreadable, folder / "system/applications/a.desktop");
+  install("system", "b.desktop", other);
+  EXPECT_EQ(identifierOf(program), "a");
+  EXPECT_TRUE(catalogue.isInstalled("a"));
+  EXPECT_EQ(identifierOf(other), "b");
+  std::filesystem::remove(folder / "system/applications/a.desktop");
+  EXPECT_EQ(identifierOf(program), std::nullopt);
+  EXPECT_FALSE(catalogue.isInstalled("a"));
+}
+
+TEST_F(DesktopCatalogueTest, AFileThatWasNeverReadIsThatOfAnApplication) {
+  test::makeFolder(folder / "system/applications");
+  std::filesystem::create_symlink(kUnreadable, folder / "system/applications/a.desktop");
+  EXPECT_TRUE(catalogue.isInstalled("a"));
+  EXPECT_FALSE(catalogue.isInstalled("b"));
 }
 
 TEST_F(DesktopCatalogueTest, WhatIsNoReadableFileIsPassedOver) {
@@ -108,6 +202,8 @@ TEST_F(DesktopCatalogueTest, WhatIsNoReadableFileIsPassedOver) {
   std::filesystem::resize_file(applications + "/huge.desktop", std::uintmax_t{1} << 40);
   install("user", "photos.desktop", program);
   EXPECT_EQ(identifierOf(program), "photos");
+  for (const char* none : {"folder", "fifo", "device", "dangling", "huge"})
+    EXPECT_FALSE(catalogue.isInstalled(none)) << none;
 }
 
 TEST_F(DesktopCatalogueTest, AnAbsolutePathIsInstalledWhenItIsAnExecutableFile) {

@@ -35,16 +35,13 @@ bool isOurRoot(int root) {
   return ::stat("/", &ours) == 0 && ::fstat(root, &theirs) == 0 && isSameFile(ours, theirs);
 }
 
-/// The root that a sandbox made for the process and left its description at. At our own root that would say
-/// nothing of the process. Whatever lies there counts, for nobody but a sandbox puts anything of that name
-/// there.
-UniqueFd flatpakRoot(int process) {
-  UniqueFd root(::openat(process, "root", O_PATH | O_DIRECTORY | O_CLOEXEC));
+/// Whether a sandbox made this root for the process and left its description there. At our own root that
+/// would say nothing of the process. Whatever lies there counts, for nobody but a sandbox puts anything of
+/// that name there.
+bool isFlatpakRoot(int root) {
   struct stat info {};
-  if (!root || isOurRoot(root.get())) return UniqueFd();
-  if (::fstatat(root.get(), kFlatpakInfo, &info, AT_SYMLINK_NOFOLLOW) != 0 && errno == ENOENT)
-    return UniqueFd();
-  return root;
+  return !isOurRoot(root) &&
+         (::fstatat(root, kFlatpakInfo, &info, AT_SYMLINK_NOFOLLOW) == 0 || errno != ENOENT);
 }
 
 std::optional<std::string> flatpakApplication(int root) {
@@ -52,9 +49,19 @@ std::optional<std::string> flatpakApplication(int root) {
   return info ? applicationInFlatpakInfo(*info) : std::nullopt;
 }
 
-std::optional<std::string> snapName(int process) {
-  const auto label = readFileIn(process, "attr/current", kLargestLabel);
-  return label ? snapInSecurityLabel(*label) : std::nullopt;
+/// Of a file in /proc that names a label: the kernel has none to tell, or tells nobody like us about any
+/// process.
+bool meansNoLabel(int error) {
+  return error == ENOENT || error == EINVAL || error == EOPNOTSUPP || error == EACCES || error == EPERM;
+}
+
+/// Empty where processes have no labels; none when it cannot be told.
+std::optional<std::string> securityLabel(int process) {
+  const UniqueFd fd(::openat(process, "attr/current", O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+  if (!fd) return meansNoLabel(errno) ? std::optional<std::string>("") : std::nullopt;
+  errno = 0;
+  auto label = readSmallFile(fd.get(), kLargestLabel);
+  return !label && meansNoLabel(errno) ? "" : label;
 }
 
 /// Where the executable lies. None when that is not where we find it: it was removed or replaced since it was
@@ -83,8 +90,17 @@ std::optional<std::string> TaskIdentity::codeSigningIdentifier(const AuditToken&
 }
 
 std::optional<std::string> TaskIdentity::identifierOf(int process) const {
-  if (const UniqueFd root = flatpakRoot(process)) return flatpakApplication(root.get());
-  if (auto snap = snapName(process)) return snap;
+  const UniqueFd root(::openat(process, "root", O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (root && isFlatpakRoot(root.get())) return flatpakApplication(root.get());
+  const auto label = securityLabel(process);
+  if (!label) return std::nullopt;
+  if (auto snap = snapInSecurityLabel(*label)) return snap;
+  // The program of a process in a sandbox says nothing, so it counts only where there is surely none. Who may
+  // not look at the root may not look at the program either, but a process can change that in between.
+  return root ? identifierOfProgram(process) : std::nullopt;
+}
+
+std::optional<std::string> TaskIdentity::identifierOfProgram(int process) const {
   struct stat program {};
   if (::fstatat(process, "exe", &program, 0) != 0) return std::nullopt;
   if (auto application = applications_.identifierOfProgram(program.st_dev, program.st_ino))

@@ -20,12 +20,14 @@ class TaskIdentity {
   /// The first of: the Flatpak application id (/.flatpak-info in the peer's root), the snap name (security
   /// label), the id of the desktop file whose program the peer runs, the absolute path of its executable.
   /// None when the process has ended, or may be another one by now, or cannot be looked at; when its sandbox
-  /// does not say clearly which application it is; and when its executable cannot be found by its path,
-  /// because it was removed or replaced, or because the path is one of another mount namespace.
+  /// does not say clearly which application it is, or it cannot be told whether it has one; and when its
+  /// executable cannot be found by its path, because it was removed or replaced, or because the path is one
+  /// of another mount namespace.
   std::optional<std::string> codeSigningIdentifier(const AuditToken& token) const;
 
  private:
   std::optional<std::string> identifierOf(int process) const;
+  std::optional<std::string> identifierOfProgram(int process) const;
 
   const InstalledApplications& applications_;
 };

@@ -8,10 +8,12 @@
 #include <unistd.h>
 
 #include <filesystem>
+#include <set>
 
 #include "peer.h"
 #include "platform/applications/desktop_catalogue.h"
 #include "platform/identity/task_identity.h"
+#include "support/descriptor_limit.h"
 #include "support/temporary_folder.h"
 
 namespace brivo {
@@ -38,6 +40,27 @@ class SandboxedPeersTest : public testing::Test {
   std::optional<std::string> identifierAtRoot() {
     return identifierOf(
         Peer([this] { return test::enterUserNamespace(CLONE_NEWNS) && ::chroot(root.c_str()) == 0; }));
+  }
+  /// What it is known as with fewer and fewer descriptors to find out with; "" when it is nobody.
+  std::set<std::string> identifiersWithFewDescriptors(const Peer& peer) {
+    std::set<std::string> identifiers;
+    for (rlim_t spare = 0; spare < 8; ++spare) {
+      const test::DescriptorLimit limit(spare);
+      identifiers.insert(identifierOf(peer).value_or(""));
+    }
+    return identifiers;
+  }
+  /// Whether `condition` is true of a process whose label is what the file `label` says.
+  bool holdsWithLabel(const std::string& label, const std::function<bool(const Peer&)>& condition) {
+    const auto check = [&] {
+      if (!test::enterUserNamespace(CLONE_NEWNS)) return 1;
+      const Peer peer;
+      if (identifierOf(peer) != self) return 2;
+      const std::string file = "/proc/" + std::to_string(peer.pid()) + "/attr/current";
+      if (::mount(label.c_str(), file.c_str(), nullptr, MS_BIND, nullptr) != 0) return 3;
+      return condition(peer) ? 0 : 4;
+    };
+    return test::runInChild(check) == 0;
   }
   void describeFlatpak(std::string_view content) { test::writeFile(info, content); }
 
@@ -100,6 +123,27 @@ TEST_F(SandboxedPeersTest, ABinaryDescriptionNamesNobody) {
     describeFlatpak(content);
     EXPECT_EQ(identifierAtRoot(), std::nullopt) << content;
   }
+}
+
+TEST_F(SandboxedPeersTest, WithoutDescriptorsAFlatpakIsNobodyAndNeverItsProgram) {
+  describeFlatpak("[Application]\nname=org.example.Photos\n");
+  const Peer peer([this] { return test::enterUserNamespace(CLONE_NEWNS) && ::chroot(root.c_str()) == 0; });
+  EXPECT_EQ(identifiersWithFewDescriptors(peer), (std::set<std::string>{"", "org.example.Photos"}));
+}
+
+TEST_F(SandboxedPeersTest, ASnapIsKnownByItsLabelAndWithoutDescriptorsIsNobody) {
+  if (!fs::exists("/proc/self/attr/current")) GTEST_SKIP() << "this kernel labels no processes";
+  test::writeFile(folder / "label", "snap.camera-app.import (enforce)\n");
+  EXPECT_TRUE(holdsWithLabel(folder / "label", [this](const Peer& peer) {
+    return identifierOf(peer) == "camera-app" &&
+           identifiersWithFewDescriptors(peer) == std::set<std::string>{"", "camera-app"};
+  }));
+}
+
+TEST_F(SandboxedPeersTest, WhoseLabelCannotBeReadIsNobody) {
+  if (!fs::exists("/proc/self/attr/current")) GTEST_SKIP() << "this kernel labels no processes";
+  ASSERT_EQ(::mkfifo((folder / "label").c_str(), 0600), 0);
+  EXPECT_TRUE(holdsWithLabel(folder / "label", [this](const Peer& peer) { return !identifierOf(peer); }));
 }
 
 TEST_F(SandboxedPeersTest, AProgramMountedOverAnotherIsNotTakenForIt) {

@@ -13,7 +13,8 @@ namespace brivo {
 
 class FakeConnection : public zeph::Connection {
  public:
-  explicit FakeConnection(std::int32_t pid) : token_(AuditToken::ofCredentials({pid, 0, 0})) {}
+  explicit FakeConnection(std::int32_t pid) : FakeConnection(AuditToken::ofCredentials({pid, 0})) {}
+  explicit FakeConnection(AuditToken token) : token_(std::move(token)) {}
 
   const AuditToken& auditToken() const override { return token_; }
   void setExportedInterface(zeph::Interface) override {}

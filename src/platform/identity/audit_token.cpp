@@ -46,7 +46,7 @@ AuditToken AuditToken::ofPeer(int fd) {
   ucred peer{};
   socklen_t size = sizeof peer;
   if (::getsockopt(fd, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return AuditToken({}, UniqueFd());
-  const Credentials credentials{peer.pid > 0 ? peer.pid : -1, peer.uid, peer.gid};
+  const Credentials credentials{peer.pid > 0 ? peer.pid : -1, peer.uid};
   int pidfd = -1;
   size = sizeof pidfd;
   if (::getsockopt(fd, SOL_SOCKET, SO_PEERPIDFD, &pidfd, &size) == 0)
@@ -61,7 +61,7 @@ AuditToken AuditToken::ofCredentials(const Credentials& credentials, UniqueFd pi
   return AuditToken(credentials, UniqueFd(), startTimeOf(credentials.pid));
 }
 
-AuditToken AuditToken::ofThisProcess() { return ofCredentials({::getpid(), ::getuid(), ::getgid()}); }
+AuditToken AuditToken::ofThisProcess() { return ofCredentials({::getpid(), ::getuid()}); }
 
 bool AuditToken::isAlive() const {
   if (startTime_) return startTimeOf(credentials_.pid) == startTime_;
@@ -70,7 +70,7 @@ bool AuditToken::isAlive() const {
 }
 
 std::optional<std::int32_t> AuditToken::currentProcessIdentifier() const {
-  if (startTime_) return credentials_.pid;
+  if (startTime_) return isAlive() ? std::optional(credentials_.pid) : std::nullopt;
   if (pidfd() < 0) return std::nullopt;
   const auto text = readProcessFile("/proc/self/fdinfo/" + std::to_string(pidfd()));
   return text ? processInFdinfo(*text) : std::nullopt;

@@ -19,7 +19,6 @@ class AuditToken {
   struct Credentials {
     std::int32_t pid = -1;
     std::uint32_t uid = static_cast<std::uint32_t>(-1);
-    std::uint32_t gid = static_cast<std::uint32_t>(-1);
   };
 
   /// The process that connected to (or made the pair of) the unix socket `fd`: SO_PEERCRED and
@@ -34,7 +33,6 @@ class AuditToken {
   /// -1 when the kernel did not tell.
   std::int32_t processIdentifier() const { return credentials_.pid; }
   std::uint32_t userIdentifier() const { return credentials_.uid; }
-  std::uint32_t groupIdentifier() const { return credentials_.gid; }
   /// Borrowed; -1 when there is none.
   int pidfd() const { return pidfd_->get(); }
 

@@ -99,14 +99,12 @@ constexpr std::array<Row, 9> kServed{{{selectors::kRequestReadData, requestReadD
 bool DeviceService::acceptConnection(const zeph::Connection& connection) {
   const auto identifier = services_.codeSigningIdentifier(connection.auditToken());
   if (!services_.access || !identifier) return false;
+  // The identifier of a process that has ended may be another one's now, which gets a decision of its own.
+  std::erase_if(decided_, [](const auto& entry) { return !entry.second.isAlive(); });
   const std::string signingKey = fmt::format("{}-{}", *identifier, connection.processIdentifier());
-  const auto isKnown = [&](const auto& keys) { return std::ranges::find(keys, signingKey) != keys.end(); };
-  if (isKnown(addedBundles_) || isKnown(deniedBundles_)) return false;
+  if (!decided_.emplace(signingKey, connection.auditToken()).second) return false;
   bool enabled = false;
-  const bool admitted =
-      services_.access->applicationWithBundleIdentifierHasAccess(*identifier, enabled) && enabled;
-  (admitted ? addedBundles_ : deniedBundles_).push_back(signingKey);
-  return admitted;
+  return services_.access->applicationWithBundleIdentifierHasAccess(*identifier, enabled) && enabled;
 }
 
 bool DeviceService::shouldAcceptNewConnection(zeph::Listener&,

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <map>
 #include <memory>
 #include <string>
-#include <vector>
 
 #include "device/device_services.h"
 #include "platform/zeph/listener.h"
@@ -27,15 +27,14 @@ class DeviceService final : public zeph::ListenerDelegate, public zeph::Exported
   void handle(zeph::Invocation invocation) override;
 
  private:
-  /// The access check. The decision stands for the process as long as the device lives.
+  /// The access check. The decision stands for the process as long as that and the device live.
   bool acceptConnection(const zeph::Connection& connection);
 
   BrivoDevice& device_;
   const DeviceServices& services_;
-  // Signing keys, identifier and process, of processes that were let in and that were refused. Listener's
-  // queue.
-  std::vector<std::string> addedBundles_;
-  std::vector<std::string> deniedBundles_;
+  // The processes that were decided about, let in or refused, by their signing keys: identifier and process
+  // identifier. Listener's queue.
+  std::map<std::string, AuditToken> decided_;
 };
 
 }  // namespace brivo

@@ -6,8 +6,9 @@ import sys
 import time
 
 from gi.repository import GLib
-from front_door import SessionBus, device_list, error_name, knock, open_device, open_manager, read_all, wait_for_file
+from front_door import device_list, error_name, knock, open_device, open_manager, read_all, wait_for_file
 from harness import MANAGER, Connection, hung_up
+from session_bus import SessionBus
 
 
 class OtherBus(SessionBus):

@@ -7,7 +7,8 @@ import sqlite3
 import subprocess
 
 from harness import BRIVOCTL, PYTHON, WAIT, ServiceTest, wait_until
-from notification_server import NotificationServer, SessionBus, dismissing, pressing
+from notification_server import NotificationServer, dismissing, pressing
+from session_bus import SessionBus
 
 SUCCESS, FAILURE, USAGE, _, REFUSED = range(5)
 APPLICATION = "/usr/bin/env"  # installed everywhere
@@ -36,6 +37,7 @@ class AskTest(CommandTest):
         super().setUp()
         self.bus = SessionBus()
         self.addCleanup(self.bus.close)
+        self.bus.start()
         self.service.environment["DBUS_SESSION_BUS_ADDRESS"] = self.bus.address
 
     def server(self, **options):

@@ -9,8 +9,9 @@ import subprocess
 import unittest
 
 from gi.repository import GLib
-from front_door import NAME, SessionBus, device_list, open_device, open_manager
+from front_door import device_list, open_device, open_manager
 from harness import BUILD, PYTHON, WAIT, ClientProcess, Service, make_card, needs, wait_until
+from session_bus import NAME, SessionBus
 
 CLIENT = os.path.join(os.path.dirname(os.path.abspath(__file__)), "door_client.py")
 

@@ -9,10 +9,11 @@ import subprocess
 import unittest
 
 from gi.repository import Gio, GLib
-from front_door import DOOR, LIMITS_EXCEEDED, NAME, UNKNOWN_DEVICE, SessionBus, WithoutDescriptors, device_list
+from front_door import DOOR, LIMITS_EXCEEDED, UNKNOWN_DEVICE, WithoutDescriptors, device_list
 from front_door import error_name, knock, open_device, open_manager, read_all, wait_for_file
 from harness import BRIVOD, BUILD, IS_ROOT, PATH, PYTHON, WAIT, Service, ServiceTest, needs, needs_root
 from harness import hung_up, wait_until
+from session_bus import NAME, SessionBus
 
 CLIENT = os.path.join(os.path.dirname(os.path.abspath(__file__)), "door_client.py")
 NOBODY = 65534

@@ -1,11 +1,10 @@
 // SPDX-License-Identifier: MIT
 #include "brivoctl/asker.h"
 
-#include <csignal>
-
 namespace brivoctl {
 
 Asker::Asker() {
+  pthread_sigmask(SIG_BLOCK, nullptr, &blockedBefore_);
   loop_.onSignals({SIGINT, SIGTERM, SIGHUP}, [this] {
     interrupted_ = true;
     alerts_.dismissAll();
@@ -16,6 +15,7 @@ Asker::Asker() {
 Asker::~Asker() {
   loop_.quit();
   thread_.join();
+  pthread_sigmask(SIG_SETMASK, &blockedBefore_, nullptr);
 }
 
 brivo::Result<brivo::UserAlert::Response, Asker::Failure> Asker::ask(const brivo::Dictionary& alert) {

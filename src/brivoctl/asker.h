@@ -2,6 +2,7 @@
 #pragma once
 
 #include <atomic>
+#include <csignal>
 #include <thread>
 
 #include "platform/alerts/desktop_notifications.h"
@@ -14,9 +15,12 @@ namespace brivoctl {
 /// while this lives they do nothing else. *Thread-bound*, and made before the first thread of the process.
 class Asker {
  public:
+  /// Why there is no answer: no program shows questions, or a signal came before the answer.
   enum class Failure { nobodyThere, interrupted };
 
   Asker();
+  /// Waits ten seconds at most for a program that has not said yet what it shows. A signal that comes from
+  /// now on does what it did before this was made: it ends the process at once.
   ~Asker();
   Asker(const Asker&) = delete;
   Asker& operator=(const Asker&) = delete;
@@ -25,6 +29,7 @@ class Asker {
   brivo::Result<brivo::UserAlert::Response, Failure> ask(const brivo::Dictionary& alert);
 
  private:
+  sigset_t blockedBefore_{};
   brivo::RunLoop loop_;
   brivo::DesktopNotifications alerts_{loop_};
   std::atomic<bool> interrupted_ = false;

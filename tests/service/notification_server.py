@@ -70,14 +70,16 @@ class NotificationServer:
         if method == "GetCapabilities":
             call.return_value(GLib.Variant("(as)", (self.capabilities,)))
         elif method == "Notify":
-            notification = Notification(len(self.shown) + 1, sender, arguments.unpack())
-            call.return_value(GLib.Variant("(u)", (notification.number,)))
-            self.shown.append(notification)
-            if self.answer:
-                self.answer(self, notification)
+            self._show(Notification(len(self.shown) + 1, sender, arguments.unpack()), call)
         else:
             self.withdrawn.append(arguments.unpack()[0])
             call.return_value(None)
+
+    def _show(self, notification, call):
+        call.return_value(GLib.Variant("(u)", (notification.number,)))
+        self.shown.append(notification)
+        if self.answer:
+            self.answer(self, notification)
 
     def _signal(self, member, arguments):
         self._bus.emit_signal(None, PATH, NAME, member, arguments)
@@ -98,6 +100,20 @@ class NotificationServer:
         """Ends it, after what it has answered has gone out."""
         self._loop.quit()
         self._thread.join(WAIT)
+
+
+class SlowNotificationServer(NotificationServer):
+    """Shows a notification, and says so `delay` seconds later."""
+
+    def __init__(self, bus, delay):
+        self.delay = delay
+        super().__init__(bus)
+
+    def _show(self, notification, call):
+        self.shown.append(notification)
+        timer = GLib.timeout_source_new(self.delay * 1000)
+        timer.set_callback(lambda _: call.return_value(GLib.Variant("(u)", (notification.number,))))
+        timer.attach(self._context)
 
 
 def pressing(label):

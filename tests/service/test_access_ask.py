@@ -7,7 +7,7 @@ import sqlite3
 import subprocess
 
 from harness import BRIVOCTL, PYTHON, WAIT, ServiceTest, wait_until
-from notification_server import NotificationServer, dismissing, pressing
+from notification_server import NotificationServer, SlowNotificationServer, dismissing, pressing
 from session_bus import SessionBus
 
 SUCCESS, FAILURE, USAGE, _, REFUSED = range(5)
@@ -259,6 +259,30 @@ class WaitingTest(AskTest):
                     self.assertIn(b"interrupted", process.stderr.read())
                     wait_until(lambda: server.shown[-1].number in server.withdrawn, "an empty screen")
         self.assertEqual(self.rows("orvid_apps") + self.rows("camera_control"), [])
+
+    def test_a_signal_before_the_server_has_answered_leaves_nothing_on_the_screen_either(self):
+        server, process = self.asking_a_server_that_answers_after(2)
+        process.send_signal(signal.SIGINT)
+        self.assertEqual(process.wait(WAIT), FAILURE)
+        wait_until(lambda: server.withdrawn == [1], "an empty screen")
+
+    def test_a_second_signal_waits_for_no_server(self):
+        _, process = self.asking_a_server_that_answers_after(3600)
+
+        def ended_by_another():
+            process.send_signal(signal.SIGINT)
+            return process.poll() is not None
+
+        wait_until(ended_by_another, "the end")
+        self.assertEqual(process.returncode, -signal.SIGINT)
+        self.assertIn(b"interrupted", process.stderr.read(), "that was the first one")
+
+    def asking_a_server_that_answers_after(self, seconds):
+        server = SlowNotificationServer(self.bus, seconds)
+        self.addCleanup(server.close)
+        process = self.asking(APPLICATION)
+        wait_until(lambda: server.shown, "the question")
+        return server, process
 
     def test_two_questions_at_once_are_answered_each_by_itself(self):
         server = self.server()

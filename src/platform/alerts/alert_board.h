@@ -43,7 +43,8 @@ class AlertBoard : public std::enable_shared_from_this<AlertBoard> {
   void withdraw(const std::shared_ptr<Alert>& alert);
   /// Withdraws every alert as dismissed.
   void dismissAll();
-  /// The same, and leaves the bus; waits a second at most for a server that is just being asked.
+  /// The same, and leaves the bus; waits ten seconds at most for a server that is just being asked. Also when
+  /// the loop does not run any more.
   void end();
 
  private:

@@ -27,8 +27,8 @@ class DesktopNotifications final : public UserAlerts {
   /// Works on `loop`, which must run in another thread than those that show alerts and must outlive every
   /// alert. A server that has not shown an alert within `patience` counts as none.
   explicit DesktopNotifications(RunLoop& loop, std::chrono::milliseconds patience = kPatience);
-  /// Dismisses every alert, so that nobody waits any more. Loop thread, or when the loop does not run any
-  /// more.
+  /// Dismisses every alert, so that nobody waits any more; waits ten seconds at most for a server that is
+  /// just being asked to show one. Loop thread, or when the loop does not run any more.
   ~DesktopNotifications() override;
 
   /// Null when there is no session bus, no server, one that shows no buttons, or one that refuses. Waits for

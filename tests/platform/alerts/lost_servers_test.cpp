@@ -208,24 +208,16 @@ TEST_F(LostServerTest, AfterANewBusHasComeAlertsAreShownThere) {
 }
 
 /// The bus knows how to start a server; what it starts says so by making a file.
-struct StartableServer {
-  StartableServer() {
-    test::writeFile(
-        home / "dbus-1/services/server.service",
-        "[D-BUS Service]\nName=org.freedesktop.Notifications\nExec=/usr/bin/touch " + sign + "\n");
-  }
-
-  test::TemporaryFolder home;
-  const std::string sign = home / "started";
-  test::ScopedVariable dataHome{"XDG_DATA_HOME", home.path()};
-};
-
-class StartableServerTest : protected StartableServer, public test::AlertsTest {
+class StartableServerTest : public test::AlertsTest {
  protected:
+  void SetUp() override { bus.addService("org.freedesktop.Notifications", "/usr/bin/touch " + sign); }
   void waitUntilStarted() {
     EXPECT_TRUE(waitUntil([&] { return ::access(sign.c_str(), F_OK) == 0; }));
     ::unlink(sign.c_str());
   }
+
+  const test::TemporaryFolder folder;
+  const std::string sign = folder / "started";
 };
 
 TEST_F(StartableServerTest, AServerThatDoesNotRunIsStartedAndStartedAgainWhenItGoes) {

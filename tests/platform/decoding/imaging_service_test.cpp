@@ -5,17 +5,16 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <signal.h>
-#include <sys/ioctl.h>
 #include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <array>
 #include <atomic>
 #include <random>
 #include <thread>
 
 #include "platform/decoding/worker_program.h"
+#include "support/command_pipe.h"
 #include "support/open_file.h"
 #include "support/processes.h"
 #include "support/raw_dbus.h"
@@ -24,9 +23,9 @@
 namespace brivo {
 namespace {
 
-using std::chrono::milliseconds;
 using std::chrono::seconds;
 using test::childrenOf;
+using test::CommandPipe;
 using test::fileWith;
 using test::openDescriptorCount;
 using test::waitUntil;
@@ -65,28 +64,6 @@ std::string answerTo(ImagingService& service, std::string_view command) {
   const auto answer = service.thumbnail(fileWith(command), {});
   return answer ? std::string(answer->text()) : "nothing";
 }
-
-/// A command in a pipe: it shows when a worker has taken it.
-class CommandPipe {
- public:
-  explicit CommandPipe(std::string_view command) {
-    std::array<int, 2> ends{};
-    EXPECT_EQ(::pipe2(ends.data(), O_CLOEXEC), 0);
-    reader_.reset(ends[0]);
-    writer_.reset(ends[1]);
-    EXPECT_EQ(::write(writer_.get(), command.data(), command.size()), static_cast<ssize_t>(command.size()));
-  }
-
-  const UniqueFd& file() const { return reader_; }
-  bool isTaken() const {
-    int left = -1;
-    return ::ioctl(reader_.get(), FIONREAD, &left) == 0 && left == 0;
-  }
-
- private:
-  UniqueFd reader_;
-  UniqueFd writer_;
-};
 
 TEST(ImagingServiceTest, ARequestReachesTheDecoderAsItIs) {
   WorkerPool workers(probingWorkers());
@@ -152,7 +129,7 @@ class FaultTest : public testing::TestWithParam<const char*> {};
 
 TEST_P(FaultTest, CostsOneRequestAndNothingElse) {
   WorkerOptions options = probingWorkers(1);
-  options.budget = milliseconds(300);
+  options.budget = seconds(5);
   WorkerPool workers(options);
   ImagingService service(workers);
   const std::string before = answerTo(service, "process");

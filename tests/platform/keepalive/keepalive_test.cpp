@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <vector>
 
 #include "platform/keepalive/idle_exit.h"
@@ -10,6 +11,14 @@ namespace brivo {
 namespace {
 
 using namespace std::chrono_literals;
+
+/// Runs `task` on the loop as soon as `condition` holds.
+void when(RunLoop& loop, const std::function<bool()>& condition, const std::function<void()>& task) {
+  loop.postAfter(1ms, [&loop, condition, task] {
+    if (condition()) return task();
+    when(loop, condition, task);
+  });
+}
 
 TEST(TransactionsTest, CountsWhatIsUnderWayAndTellsWhenNothingIs) {
   Transactions transactions;
@@ -66,14 +75,16 @@ TEST(IdleExitTest, OneLastCheckIsMadeAtATime) {
   Transactions transactions;
   std::vector<std::function<void(bool)>> checks;
   const IdleExit exit(loop, transactions, 0s, [&](const auto& answer) { checks.push_back(answer); });
-  loop.postAfter(20ms, [&] {
+  const auto hasBeenAsked = [&](std::size_t times) { return [&, times] { return checks.size() >= times; }; };
+  when(loop, hasBeenAsked(1), [&] {
     transactions.begin("x").reset();  // somebody who comes and goes during the check
     loop.postAfter(20ms, [&] {
       EXPECT_EQ(checks.size(), 1u);
       checks[0](false);
-      loop.postAfter(20ms, [&] { checks.at(1)(true); });
+      when(loop, hasBeenAsked(2), [&] { checks[1](true); });
     });
   });
+  loop.postAfter(20s, [&] { loop.quit(); });
   loop.run();
   EXPECT_EQ(checks.size(), 2u);
 }

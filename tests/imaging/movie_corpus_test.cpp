@@ -105,16 +105,28 @@ TEST_F(MovieCorpusTest, EveryMovieWithPicturesShowsOne) {
   }
 }
 
+/// Empty when the movie does not say it.
+std::string valueIn(const MovieDescription& movie, const std::string& key) {
+  for (const auto& [name, value] : movie.metadata) {
+    if (name == key) return value;
+  }
+  return {};
+}
+
 TEST_F(MovieCorpusTest, MakeAndModelAreWhatOthersFind) {
+  std::size_t compared = 0;
   for (const CorpusFile& file : moviesOf(*corpus)) {
-    if (!file.facts.contains("movie") || !file.facts.contains("make")) continue;
+    // In AVCHD the pictures say it, the make as a number, and not the container, which is what we read.
+    if (!file.facts.contains("movie") || file.facts.value("mime_type", "") == "video/m2ts") continue;
     SCOPED_TRACE(file.name);
     const auto movie = reader.describe(open(file));
-    ASSERT_TRUE(movie);
-    for (const auto& [key, value] : movie->metadata) {
-      EXPECT_EQ(value, file.facts.value(key, value));
+    for (const char* key : {"make", "model"}) {
+      const std::string expected = file.facts.value(key, "");
+      EXPECT_EQ(movie ? valueIn(*movie, key) : "", expected) << key;
+      compared += expected.empty() ? 0 : 1;
     }
   }
+  EXPECT_GE(compared, 2u);
 }
 
 TEST_F(MovieCorpusTest, AMovieOfATestCameraSaysItsMakeAndModel) {

@@ -8,16 +8,13 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <atomic>
 #include <filesystem>
 #include <thread>
 
 #include "database_fixture.h"
 #include "support/file_size_limit.h"
 #include "support/mounts.h"
-#include "support/processes.h"
 #include "support/standard_error.h"
-#include "support/wait.h"
 
 namespace brivo {
 namespace {
@@ -317,21 +314,6 @@ TEST_F(DatabaseFaultsTest, AFileThatMayNotGrowTakesNoGrantMoreAndLosesNone) {
   EXPECT_EQ(ask("PRAGMA integrity_check"), "ok");
   database->addApplicationWithBundleIdentifier("org.example.App", true);
   EXPECT_EQ(open()->bundleIdentifiersAccessingExternalCameras().size(), granted.size() + 1);
-}
-
-TEST_F(DatabaseFaultsTest, ALockedFileIsWaitedFor) {
-  const auto database = open();
-  const auto other = plain();
-  ASSERT_FALSE(other->execute("BEGIN EXCLUSIVE"));
-  std::atomic<pid_t> adding = 0;
-  std::thread add([&] {
-    adding = ::gettid();
-    database->addApplicationWithBundleIdentifier("org.example.App", true);
-  });
-  EXPECT_TRUE(test::waitUntil([&] { return adding != 0 && test::isBlocked(adding); }));
-  EXPECT_FALSE(other->execute("COMMIT"));
-  add.join();
-  EXPECT_THAT(database->bundleIdentifiersAccessingExternalCameras(), ElementsAre("org.example.App"));
 }
 
 TEST_F(DatabaseFaultsTest, AFileThatStaysLockedGrantsNothingAndIsToldOf) {

@@ -4,10 +4,15 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sqlite3.h>
+#include <unistd.h>
 
+#include <atomic>
 #include <filesystem>
+#include <future>
 
+#include "support/processes.h"
 #include "support/temporary_folder.h"
+#include "support/wait.h"
 
 namespace brivo {
 namespace {
@@ -136,6 +141,21 @@ TEST_F(DatabaseTest, TriggersAndViewsInTheFileAreNotRun) {
   ASSERT_FALSE(database->execute("SELECT a FROM trace", {}, [&](const auto&) { ++traces; }));
   EXPECT_EQ(traces, 0);
   EXPECT_THAT(database->execute("SELECT a FROM everything").value_or(""), HasSubstr("prohibited"));
+}
+
+TEST_F(DatabaseTest, AFileThatIsLockedIsWaitedFor) {
+  const auto database = open();
+  ASSERT_FALSE(database->execute("CREATE TABLE t (number INTEGER)"));
+  const auto other = open();
+  ASSERT_FALSE(other->execute("BEGIN EXCLUSIVE"));
+  std::atomic<pid_t> thread = 0;
+  auto adding = std::async(std::launch::async, [&] {
+    thread = ::gettid();
+    return database->execute("INSERT INTO t VALUES (1)");
+  });
+  EXPECT_TRUE(test::waitUntil([&] { return thread != 0 && test::isBlocked(thread); }));
+  EXPECT_FALSE(other->execute("COMMIT"));
+  EXPECT_EQ(adding.get(), std::nullopt);
 }
 
 TEST_F(DatabaseTest, TwoConnectionsSeeEachOthersWrites) {

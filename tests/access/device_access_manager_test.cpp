@@ -120,11 +120,12 @@ TEST_F(DeviceAccessManagerTest, AnUninstalledApplicationLosesItsRowsAtItsNextChe
 }
 
 TEST_F(DeviceAccessManagerTest, AnIdentifierThatContainsTheVendorPrefixKeepsItsRows) {
-  const std::string vendors = "org.orvid.Tool";
-  database.addApplicationWithBundleIdentifier(vendors, true);
-  bool enabled = false;
-  EXPECT_TRUE(manager.applicationWithBundleIdentifierHasAccess(vendors, enabled));
-  EXPECT_TRUE(enabled);
+  for (const char* vendors : {"org.orvid.Tool", "com.example.org.orvid.x"}) {
+    database.addApplicationWithBundleIdentifier(vendors, true);
+    bool enabled = false;
+    EXPECT_TRUE(manager.applicationWithBundleIdentifierHasAccess(vendors, enabled)) << vendors;
+    EXPECT_TRUE(enabled) << vendors;
+  }
 }
 
 TEST_F(DeviceAccessManagerTest, AnInstalledApplicationWithoutARowIsNotValidEither) {

@@ -8,6 +8,8 @@
 #include <string_view>
 #include <utility>
 
+#include "platform/bus/bus_message.h"
+
 namespace brivo {
 
 namespace {
@@ -20,20 +22,16 @@ constexpr std::uint8_t kCritical = 2;          // what servers do not take away 
 constexpr std::int32_t kNever = 0;
 constexpr std::uint64_t kNoLimit = UINT64_MAX;
 
-struct MessageEnd {
-  void operator()(sd_bus_message* message) const { sd_bus_message_unref(message); }
-};
-using Message = std::unique_ptr<sd_bus_message, MessageEnd>;
-
 std::string senderOf(sd_bus_message* message) {
   const char* sender = sd_bus_message_get_sender(message);
   return sender ? sender : "";
 }
 
-Message newCall(sd_bus* bus, const char* destination, const char* member) {
-  sd_bus_message* call = nullptr;
-  if (bus) sd_bus_message_new_method_call(bus, &call, destination, kPath, kName, member);
-  return Message(call);
+/// Without a message where there is no bus.
+BusMessage newCall(sd_bus* bus, const char* destination, const char* member) {
+  BusMessage call;
+  if (bus) sd_bus_message_new_method_call(bus, call.out(), destination, kPath, kName, member);
+  return call;
 }
 
 int appendActions(sd_bus_message* message, const NotificationService::Notice& notice) {
@@ -197,20 +195,20 @@ void NotificationService::call(sd_bus_message* message, Answer onAnswer) {
 }
 
 void NotificationService::askCapabilities(const Handler<std::vector<std::string>>& onAnswer) {
-  const Message message = newCall(bus_, kName, "GetCapabilities");
-  if (!message) return onAnswer(Failure::noServer);
+  const BusMessage message = newCall(bus_, kName, "GetCapabilities");
+  if (!message.get()) return onAnswer(Failure::noServer);
   call(message.get(), [onAnswer](sd_bus_message* answer) { onAnswer(stringsIn(answer)); });
 }
 
 void NotificationService::post(const Notice& notice, const Handler<Place>& onAnswer) {
-  const Message message = newCall(bus_, kName, "Notify");
-  if (!message || appendNotice(message.get(), notice) < 0) return onAnswer(Failure::noServer);
+  const BusMessage message = newCall(bus_, kName, "Notify");
+  if (!message.get() || appendNotice(message.get(), notice) < 0) return onAnswer(Failure::noServer);
   call(message.get(), [onAnswer](sd_bus_message* answer) { onAnswer(placeIn(answer)); });
 }
 
 void NotificationService::close(const Place& place) {
-  const Message message = newCall(bus_, place.server.c_str(), "CloseNotification");
-  if (!message || sd_bus_message_append(message.get(), "u", place.id) < 0) return;
+  const BusMessage message = newCall(bus_, place.server.c_str(), "CloseNotification");
+  if (!message.get() || sd_bus_message_append(message.get(), "u", place.id) < 0) return;
   sd_bus_message_set_expect_reply(message.get(), 0);
   sd_bus_message_set_auto_start(message.get(), 0);
   sd_bus_send(bus_, message.get(), nullptr);

@@ -9,8 +9,8 @@
 #include <cstring>
 #include <limits>
 
+#include "platform/bus/bus_message.h"
 #include "platform/zeph/bus_driver.h"
-#include "platform/zeph/bus_message.h"
 #include "platform/zeph/bus_vtable.h"
 #include "platform/zeph/pass_rights.h"
 #include "platform/zeph/value_codec.h"

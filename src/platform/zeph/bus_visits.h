@@ -11,8 +11,8 @@
 #include <utility>
 #include <vector>
 
+#include "platform/bus/bus_message.h"
 #include "platform/work/run_loop.h"
-#include "platform/zeph/bus_message.h"
 #include "platform/zeph/door.h"
 
 namespace brivo::zeph {

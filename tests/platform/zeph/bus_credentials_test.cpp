@@ -6,7 +6,7 @@
 #include <systemd/sd-bus.h>
 #include <unistd.h>
 
-#include "platform/zeph/bus_message.h"
+#include "platform/bus/bus_message.h"
 #include "support/environment.h"
 #include "support/message_bus.h"
 

@@ -5,9 +5,9 @@
 
 #include <utility>
 
-namespace brivo::zeph {
+namespace brivo {
 
-/// Owns one reference to a message of sd-bus. *Thread-bound* to the I/O thread.
+/// Owns one reference to a message of sd-bus. *Thread-bound* to the thread of its bus.
 class BusMessage {
  public:
   BusMessage() = default;
@@ -28,4 +28,4 @@ class BusMessage {
   sd_bus_message* message_ = nullptr;
 };
 
-}  // namespace brivo::zeph
+}  // namespace brivo

@@ -24,27 +24,18 @@ constexpr std::array<std::pair<const char*, UserAlert::Response>, 3> kButtons{
 
 bool isControl(char16_t unit) { return unit < 0x20 || (unit >= 0x7F && unit < 0xA0); }
 
-/// U+FDD0 to U+FDEF and the last two of every plane: libsystemd refuses to send them (Unicode Standard,
-/// section 23.7).
-bool isNoncharacter(char16_t before, char16_t unit) {
-  const bool endsPlane = (before & 0xFC3F) == 0xD83F && (unit == 0xDFFE || unit == 0xDFFF);
-  return endsPlane || unit == 0xFFFE || unit == 0xFFFF || (unit >= 0xFDD0 && unit <= 0xFDEF);
-}
-
-std::string withoutUnsendable(std::string_view text, bool keepLines) {
+std::string withoutControls(std::string_view text, bool keepLines) {
   std::u16string units = toUtf16(text);
-  for (std::size_t i = 0; i < units.size(); ++i) {
-    if (isControl(units[i]) && !(keepLines && units[i] == u'\n')) units[i] = u' ';
-    // Half of a pair becomes the replacement character, and so does the other half on its way back.
-    if (isNoncharacter(i > 0 ? units[i - 1] : u'\0', units[i])) units[i] = u'\xFFFD';
+  for (char16_t& unit : units) {
+    if (isControl(unit) && !(keepLines && unit == u'\n')) unit = u' ';
   }
   return toUtf8(units);
 }
 
 std::string shortened(std::string_view text, std::size_t longest, bool keepLines) {
-  const std::string start = replacingInvalidUtf8(text.substr(0, (longest + 1) * kLongestCodePoint));
+  const std::string start = replacingNoncharacters(text.substr(0, (longest + 1) * kLongestCodePoint));
   const std::string_view kept = codePointPrefix(start, longest);
-  const std::string safe = withoutUnsendable(kept, keepLines);
+  const std::string safe = withoutControls(kept, keepLines);
   return kept.size() == start.size() ? safe : safe + "\xE2\x80\xA6";  // an ellipsis
 }
 

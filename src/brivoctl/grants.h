@@ -14,6 +14,8 @@ namespace brivoctl {
 /// The access database of this user. A running service reads it for every new connection. *Thread-bound.*
 class AccessFile {
  public:
+  /// Makes the folder and the database when they are missing. Where that fails there are no grants, and
+  /// storing one has no effect: see cannotStore().
   AccessFile();
 
   brivo::AccessDatabase& database() { return database_; }

@@ -46,6 +46,7 @@ class CameraDevice : public std::enable_shared_from_this<CameraDevice> {
   /// What bytes of the device's files are read into for clients.
   virtual ReadMemory& readMemory() = 0;
   virtual ImageDecoder& imageDecoder() const = 0;
+  /// Reads the movies of all devices; outlives the device.
   virtual MovieService& movies() const = 0;
 
   /// A queue of its own for work on one of the device's files.

@@ -41,6 +41,8 @@ class BrivoDevice final : public CameraDevice,
 
   const Url& url() const { return url_; }
   const Endpoint& endpoint() const { return listener_->endpoint(); }
+  /// The device's endpoint, for connections that do not come through it. It takes none any more when the
+  /// device has ended, whoever still holds it.
   const std::shared_ptr<zeph::Listener>& listener() const { return listener_; }
   /// The property dictionary as it is now.
   Dictionary cameraDictionary() const BRIVO_EXCLUDES(propertiesLock_);

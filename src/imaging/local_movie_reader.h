@@ -6,6 +6,7 @@
 namespace brivo {
 
 /// Reads in this process, as LocalImageDecoder decodes: for the worker, for tests and for fuzzing.
+/// *Thread-safe.*
 class LocalMovieReader final : public MovieReader {
  public:
   std::optional<MovieDescription> describe(const UniqueFd& file) override;

@@ -12,8 +12,6 @@ void AlertAnswer::move(Phase from, Phase to) {
 
 void AlertAnswer::setShown() { move(Phase::asked, Phase::shown); }
 
-void AlertAnswer::refuse() { move(Phase::asked, Phase::refused); }
-
 void AlertAnswer::answer(UserAlert::Response response) {
   const MutexLock lock(mutex_);
   if (phase_ != Phase::shown) return;
@@ -23,7 +21,7 @@ void AlertAnswer::answer(UserAlert::Response response) {
 }
 
 void AlertAnswer::giveUp() {
-  refuse();
+  move(Phase::asked, Phase::refused);
   answer(UserAlert::dismissed);
 }
 

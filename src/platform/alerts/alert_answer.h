@@ -13,8 +13,8 @@ namespace brivo {
 /// answered. What comes out of that order has no effect. *Thread-safe.*
 class AlertAnswer {
  public:
+  /// A server has it on the screen.
   void setShown() BRIVO_EXCLUDES(mutex_);
-  void refuse() BRIVO_EXCLUDES(mutex_);
   /// Only the first answer counts.
   void answer(UserAlert::Response response) BRIVO_EXCLUDES(mutex_);
   /// Nobody will answer any more: refused when it was never shown, else dismissed.

@@ -33,11 +33,14 @@ class AlertBoard : public std::enable_shared_from_this<AlertBoard> {
     std::optional<NotificationService::Place> place;  // while it is on the screen
   };
 
+  /// An empty board that has not connected yet. Any thread. `loop` must outlive it.
   static std::shared_ptr<AlertBoard> create(RunLoop& loop);
   ~AlertBoard() = default;
   AlertBoard(const AlertBoard&) = delete;
   AlertBoard& operator=(const AlertBoard&) = delete;
 
+  /// Brings an alert that was not shown before to the screen and keeps it until withdraw(). Waits for
+  /// nothing: what becomes of it is in Alert::answer, refused when nobody can be asked.
   void show(const std::shared_ptr<Alert>& alert);
   /// Takes it from the screen and forgets it.
   void withdraw(const std::shared_ptr<Alert>& alert);

@@ -56,6 +56,7 @@ class NotificationService {
 
   /// Connects when that has not been done. False when there is no session bus.
   bool connect();
+  /// Leaves the bus, and drops what is still asked: its handlers are not called. Not from a handler of this.
   void disconnect();
   /// Waits until what was asked has been answered, and calls the handlers; `limit` at most. On the loop's
   /// thread, or when the loop does not run any more; not from a handler.

@@ -16,8 +16,8 @@ class LaunchService {
 
   /// The process can be reached.
   static void ready();
-  /// The process ends, and whoever wants it from here on is to get the next one. Returns when the launch
-  /// service knows.
+  /// The process ends, and whoever wants it from here on is to get the next one. Blocks until
+  /// the launch service knows, for 5 seconds at most.
   void stopping();
   /// After stopping(): the process has to stay for somebody who came just before. Until the next stopping()
   /// the launch service is asked for patience, because there is no way back from what it was told.

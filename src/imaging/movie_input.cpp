@@ -103,6 +103,7 @@ void MovieInput::completeStreams() {
 }
 
 void MovieInput::readOnly(const AVStream& stream) {
+  wanted_ = stream.index;
   for (AVStream* other : std::span(context_->streams, context_->nb_streams))
     other->discard = other == &stream ? AVDISCARD_DEFAULT : AVDISCARD_ALL;
   bytes_.left = kMostOfPackets;
@@ -110,7 +111,12 @@ void MovieInput::readOnly(const AVStream& stream) {
 
 Packet MovieInput::next() {
   Packet packet(av_packet_alloc());
-  return packet && av_read_frame(context_, packet.get()) == 0 ? std::move(packet) : nullptr;
+  while (packet && av_read_frame(context_, packet.get()) == 0) {
+    // Covers, and what was read to find out about the streams, come whatever is discarded.
+    if (packet->stream_index == wanted_) return packet;
+    av_packet_unref(packet.get());
+  }
+  return nullptr;
 }
 
 bool isVideo(const AVStream& stream) {

@@ -32,7 +32,7 @@ class MovieInput {
 
   /// Leaves all packets out but those of `stream`, and lets up to 64 MiB of them be read.
   void readOnly(const AVStream& stream);
-  /// The next packet; null at the end, or when the limit is reached.
+  /// The next packet of that stream; null at the end, or when the limit is reached.
   Packet next();
 
  private:
@@ -61,6 +61,7 @@ class MovieInput {
   AVIOContext* reader_ = nullptr;
   AVFormatContext* context_ = nullptr;
   bool isComplete_ = false;  ///< as far as it gets
+  int wanted_ = -1;          ///< index of the stream whose packets are read
 };
 
 /// Its pictures are shown one after the other, and it is not a picture that stands for the movie.

@@ -8,6 +8,7 @@ extern "C" {
 
 #include <filesystem>
 #include <memory>
+#include <optional>
 #include <span>
 #include <stdexcept>
 
@@ -85,15 +86,78 @@ imaging::Frame frameOf(const MadeMovie& movie, int number) {
   return frame;
 }
 
-void writePackets(AVCodecContext& encoder, AVFormatContext& muxer) {
+/// Where the packets of an encoder go.
+struct Track {
+  AVFormatContext& muxer;
+  AVStream& stream;
+};
+
+void writePackets(AVCodecContext& encoder, const Track& track) {
   const imaging::Packet packet(av_packet_alloc());
   while (avcodec_receive_packet(&encoder, packet.get()) == 0) {
-    packet->duration = 1;
-    av_packet_rescale_ts(packet.get(), kFrameTime, muxer.streams[0]->time_base);
-    packet->stream_index = 0;
-    check(av_interleaved_write_frame(&muxer, packet.get()), "write a packet");
+    if (packet->duration == 0) packet->duration = 1;
+    av_packet_rescale_ts(packet.get(), encoder.time_base, track.stream.time_base);
+    packet->stream_index = track.stream.index;
+    check(av_interleaved_write_frame(&track.muxer, packet.get()), "write a packet");
   }
 }
+
+/// `frame` null: the end.
+void encode(AVCodecContext& encoder, const AVFrame* frame, const Track& track) {
+  check(avcodec_send_frame(&encoder, frame), "encode");
+  writePackets(encoder, track);
+}
+
+AVStream& addTrack(AVFormatContext& muxer, const AVCodecContext& encoder) {
+  AVStream* stream = avformat_new_stream(&muxer, nullptr);
+  stream->time_base = encoder.time_base;
+  stream->avg_frame_rate = encoder.framerate;
+  stream->sample_aspect_ratio = encoder.sample_aspect_ratio;
+  check(avcodec_parameters_from_context(stream->codecpar, &encoder), "describe the track");
+  return *stream;
+}
+
+/// A track of silence.
+class Sound {
+ public:
+  explicit Sound(AVFormatContext& muxer)
+      : encoder_(openEncoder(muxer.oformat->audio_codec)),
+        track_{muxer, addTrack(muxer, *encoder_)},
+        silence_(av_frame_alloc()) {
+    silence_->format = encoder_->sample_fmt;
+    silence_->sample_rate = encoder_->sample_rate;
+    silence_->nb_samples = encoder_->frame_size;
+    check(av_channel_layout_copy(&silence_->ch_layout, &encoder_->ch_layout), "lay out silence");
+    check(av_frame_get_buffer(silence_.get(), 0), "make silence");
+    std::fill_n(silence_->data[0], silence_->linesize[0], std::uint8_t{0});
+  }
+  /// As far as the pictures before `number`.
+  void writeUpTo(int number) {
+    for (silence_->pts = written_; av_compare_ts(written_, encoder_->time_base, number, kFrameTime) < 0;
+         silence_->pts = written_ += encoder_->frame_size)
+      encode(*encoder_, silence_.get(), track_);
+  }
+  void finish() { encode(*encoder_, nullptr, track_); }
+
+ private:
+  static Encoder openEncoder(AVCodecID id) {
+    const AVCodec* codec = avcodec_find_encoder(id);
+    if (!codec) throw std::runtime_error("no encoder of sound");
+    Encoder encoder(avcodec_alloc_context3(codec));
+    encoder->sample_fmt = *codec->sample_fmts;
+    encoder->sample_rate = 44'100;
+    encoder->time_base = {1, encoder->sample_rate};
+    av_channel_layout_default(&encoder->ch_layout, 1);
+    encoder->bit_rate = 64'000;
+    check(avcodec_open2(encoder.get(), codec, nullptr), "open the encoder of sound");
+    return encoder;
+  }
+
+  const Encoder encoder_;
+  const Track track_;
+  const imaging::Frame silence_;
+  std::int64_t written_ = 0;
+};
 
 class MuxerOptions {
  public:
@@ -115,22 +179,20 @@ void write(const MadeMovie& movie, const std::string& path) {
   check(avformat_alloc_output_context2(&made, nullptr, movie.container, path.c_str()), "make a muxer");
   const Muxer muxer(made);
   const Encoder encoder = openEncoder(movie, (muxer->oformat->flags & AVFMT_GLOBALHEADER) != 0);
-  AVStream* stream = avformat_new_stream(muxer.get(), nullptr);
-  stream->time_base = kFrameTime;
-  stream->avg_frame_rate = encoder->framerate;
-  stream->sample_aspect_ratio = movie.pixelShape;
-  check(avcodec_parameters_from_context(stream->codecpar, encoder.get()), "describe the track");
+  const Track track{*muxer, addTrack(*muxer, *encoder)};
+  std::optional<Sound> sound;
+  if (movie.hasSound) sound.emplace(*muxer);
   for (const auto& [key, value] : movie.metadata)
     av_dict_set(&muxer->metadata, key.c_str(), value.c_str(), 0);
   check(avio_open(&muxer->pb, path.c_str(), AVIO_FLAG_WRITE), "make the file");
   MuxerOptions options(movie);
   check(avformat_write_header(muxer.get(), options.get()), "write the header");
   for (int i = 0; i < movie.frames; ++i) {
-    check(avcodec_send_frame(encoder.get(), frameOf(movie, i).get()), "encode");
-    writePackets(*encoder, *muxer);
+    if (sound) sound->writeUpTo(i);
+    encode(*encoder, frameOf(movie, i).get(), track);
   }
-  check(avcodec_send_frame(encoder.get(), nullptr), "finish encoding");
-  writePackets(*encoder, *muxer);
+  encode(*encoder, nullptr, track);
+  if (sound) sound->finish();
   check(av_write_trailer(muxer.get()), "finish the file");
 }
 

@@ -22,6 +22,7 @@ struct MadeMovie {
   std::uint32_t height = 48;
   int frames = 10;  ///< 25 of them a second
   AVRational pixelShape = {1, 1};
+  bool hasSound = false;  ///< silence, in a second track
   std::vector<std::pair<std::string, std::string>> muxerOptions = {};
   std::vector<std::pair<std::string, std::string>> metadata = {};
 };

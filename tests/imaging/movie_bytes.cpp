@@ -133,6 +133,12 @@ std::string keysBox(const std::vector<std::pair<std::string, std::string>>& item
   return box("meta", handler + fullBox("keys", 0, 0, big(items.size(), 4) + keys) + box("ilst", texts));
 }
 
+std::string coverBox(const std::string& jpeg) {
+  const std::string cover = box("covr", box("data", big(13, 4) + zeros(4) + jpeg));
+  const std::string handler = fullBox("hdlr", 0, 0, zeros(4) + "mdir" + zeros(13));
+  return fullBox("meta", 0, 0, handler + box("ilst", cover));
+}
+
 std::string userText(std::string_view type, std::string_view text) {
   return box("\xA9" + std::string(type), big(text.size(), 2) + zeros(2) + std::string(text));
 }

@@ -57,6 +57,8 @@ std::string pixelShapeBox(unsigned horizontal, unsigned vertical);
 std::string editBox(unsigned duration, unsigned start);
 /// A metadata box of QuickTime keys and their texts.
 std::string keysBox(const std::vector<std::pair<std::string, std::string>>& items);
+/// User data with a JPEG that stands for the movie.
+std::string coverBox(const std::string& jpeg);
 /// A text of user data, as QuickTime has them: the type begins with the byte 0xA9.
 std::string userText(std::string_view type, std::string_view text);
 

@@ -129,6 +129,14 @@ TEST(MovieFrameTest, OfSeveralVideoTracksTheFirstIsShown) {
   EXPECT_TRUE(hasSize(frameOf(movie.build()), 32, 16));
 }
 
+TEST(MovieFrameTest, ACoverIsNotTheFirstPicture) {
+  const MovieBytes movie{.tracks = {{.samples = {blackJpeg(64, 48)}}},
+                         .userData = test::coverBox(test::madeJpeg(64, 48))};
+  const auto picture = frameOf(movie.build());
+  ASSERT_TRUE(hasSize(picture, 64, 48));
+  EXPECT_LT(luma(*picture->frame, 60, 24), 20);
+}
+
 TEST(MovieFrameTest, SoundAloneShowsNothing) {
   EXPECT_FALSE(frameOf(MovieBytes{.tracks = {{.handler = "soun", .format = "sowt"}}}.build()));
 }
@@ -162,6 +170,26 @@ TEST(MovieFrameTest, ARecordingThatBeginsInTheMiddleIsShownFromItsFirstWholePict
   const std::string file = test::madeMovie({.container = "mpegts", .encoder = "mpeg2video", .frames = 50});
   constexpr std::size_t packet = 188;  // ISO/IEC 13818-1
   EXPECT_TRUE(hasSize(frameOf(file.substr(file.size() / 2 / packet * packet)), 64, 48));
+}
+
+TEST(MovieFrameTest, OfSoundThatWasReadToFindTheTracksNothingIsLeft) {
+  for (const auto& [container, encoder] :
+       {std::pair("flv", "flv"), std::pair("mpegts", "mpeg2video"), std::pair("vob", "mpeg2video")}) {
+    const std::string file =
+        test::madeMovie({.container = container, .encoder = encoder, .frames = 50, .hasSound = true});
+    const MemorySource source(std::as_bytes(std::span(file)));
+    const auto input = MovieInput::open(source);
+    ASSERT_TRUE(input) << container;
+    input->completeStreams();
+    const auto streams = std::span(input->container().streams, input->container().nb_streams);
+    ASSERT_EQ(streams.size(), 2u) << container;
+    const AVStream& video = isVideo(*streams[0]) ? *streams[0] : *streams[1];
+    input->readOnly(video);
+    int pictures = 0;
+    for (; const Packet packet = input->next(); ++pictures)
+      ASSERT_EQ(packet->stream_index, video.index) << container;
+    EXPECT_EQ(pictures, 50) << container;
+  }
 }
 
 TEST(MovieFrameTest, CodecsThatCanHalveGiveTheSamePicture) {

@@ -123,15 +123,9 @@ TEST(MoviePropertiesTest, AMovieWithSoundAloneHasNoVideoTrack) {
 }
 
 TEST(MoviePropertiesTest, ACoverIsNoVideoTrack) {
-  const std::string jpeg = test::madeJpeg(32, 32);
-  using test::big;
-  using test::box;
-  using test::fullBox;
-  const std::string cover = box("covr", box("data", big(13, 4) + big(0, 4) + jpeg));
-  const std::string handler = fullBox("hdlr", 0, 0, std::string(4, '\0') + "mdir" + std::string(13, '\0'));
   const MovieBytes movie{.brand = "M4A ",
                          .tracks = {{.handler = "soun", .format = "sowt"}},
-                         .userData = fullBox("meta", 0, 0, handler + box("ilst", cover))};
+                         .userData = test::coverBox(test::madeJpeg(32, 32))};
   const auto found = describe(movie.build());
   ASSERT_TRUE(found);
   EXPECT_THAT(found->videoTracks, IsEmpty());

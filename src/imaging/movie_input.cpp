@@ -18,7 +18,9 @@ namespace {
 constexpr std::uint64_t kMostOfIndex = std::uint64_t{512} << 20;
 constexpr std::uint64_t kMostOfStreams = 2'097'152;
 constexpr std::uint64_t kMostOfPackets = std::uint64_t{64} << 20;
-constexpr int kReadBytes = 32'768;
+constexpr std::uint64_t kReadBytes = 32'768;
+/// At a place that was jumped to, which may be the index of one fragment of thousands.
+constexpr std::uint64_t kReadBytesThere = 4096;
 constexpr int kMostStreams = 256;
 /// Bytes that are looked at to tell what is in the tracks, unless that is known earlier.
 constexpr std::int64_t kProbeBytes = 1'048'576;
@@ -74,7 +76,10 @@ bool MovieInput::openContext() {
 
 int MovieInput::readBytes(void* opaque, std::uint8_t* buffer, int size) {
   auto& bytes = *static_cast<Bytes*>(opaque);
-  const std::uint64_t wanted = std::min(static_cast<std::uint64_t>(std::max(size, 0)), bytes.left);
+  std::uint64_t wanted = std::min(static_cast<std::uint64_t>(std::max(size, 0)), bytes.left);
+  // More than a buffer is only asked for when it is needed.
+  if (std::exchange(bytes.isElsewhere, false) && wanted <= kReadBytes)
+    wanted = std::min(wanted, kReadBytesThere);
   const auto room = std::as_writable_bytes(std::span(buffer, static_cast<std::size_t>(wanted)));
   const std::size_t count = room.empty() ? 0 : bytes.source.read(room, bytes.position);
   bytes.position += count;
@@ -92,6 +97,7 @@ std::int64_t MovieInput::seekTo(void* opaque, std::int64_t offset, int whence) {
   const bool isBeyond = offset > std::numeric_limits<std::int64_t>::max() - base;
   if (isBeyond || base + offset < 0) return AVERROR(EINVAL);
   const std::int64_t target = base + offset;
+  bytes.isElsewhere = bytes.isElsewhere || static_cast<std::uint64_t>(target) != bytes.position;
   bytes.position = static_cast<std::uint64_t>(target);
   return target;
 }

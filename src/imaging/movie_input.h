@@ -47,7 +47,8 @@ class MovieInput {
   struct Bytes {
     const images::ByteSource& source;
     std::uint64_t position = 0;
-    std::uint64_t left = 0;  ///< that may still be read
+    std::uint64_t left = 0;    ///< that may still be read
+    bool isElsewhere = false;  ///< nothing has been read since a jump
   };
 
   explicit MovieInput(const images::ByteSource& source) : bytes_{source} {}

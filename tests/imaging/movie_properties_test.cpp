@@ -246,6 +246,24 @@ TEST(MoviePropertiesTest, AMovieWithAnyOtherByteIsBounded) {
   }
 }
 
+/// Counts what is fetched of a file.
+class CountingFile final : public images::ByteSource {
+ public:
+  explicit CountingFile(const UniqueFd& fd) : source_(fd) {}
+  std::uint64_t size() const override { return source_.size(); }
+  std::size_t read(std::span<std::byte> buffer, std::uint64_t offset) const override {
+    ++reads;
+    const std::size_t count = source_.read(buffer, offset);
+    bytesRead += count;
+    return count;
+  }
+  mutable std::uint64_t reads = 0;
+  mutable std::uint64_t bytesRead = 0;
+
+ private:
+  DescriptorSource source_;
+};
+
 TEST(MoviePropertiesTest, OfAMovieOf100GiBTheIndexAtItsEndIsRead) {
   const test::TemporaryFolder folder;
   const MovieBytes movie{
@@ -258,21 +276,7 @@ TEST(MoviePropertiesTest, OfAMovieOf100GiBTheIndexAtItsEndIsRead) {
   const UniqueFd file(::open((folder / "MVI_0001.MOV").c_str(), O_RDWR | O_CLOEXEC));
   ASSERT_EQ(::pwrite(file.get(), index.data(), index.size(), static_cast<off_t>(beginning.size() + padding)),
             static_cast<ssize_t>(index.size()));
-  class Counting final : public images::ByteSource {
-   public:
-    explicit Counting(const UniqueFd& fd) : source_(fd) {}
-    std::uint64_t size() const override { return source_.size(); }
-    std::size_t read(std::span<std::byte> buffer, std::uint64_t offset) const override {
-      const std::size_t count = source_.read(buffer, offset);
-      bytesRead += count;
-      return count;
-    }
-    mutable std::uint64_t bytesRead = 0;
-
-   private:
-    DescriptorSource source_;
-  };
-  const Counting source(file);
+  const CountingFile source(file);
   const auto found = describeMovie(source);
   ASSERT_TRUE(found);
   EXPECT_EQ(found->videoTracks.at(0).formatDescriptions.at(0).cleanAperture->width, 60);
@@ -280,6 +284,56 @@ TEST(MoviePropertiesTest, OfAMovieOf100GiBTheIndexAtItsEndIsRead) {
   EXPECT_LT(source.bytesRead, kMostBesidesIndex + index.size());
   EXPECT_TRUE(firstFrameOf(source, {32, 0}));
   EXPECT_LT(source.bytesRead, 2 * (kMostBesidesIndex + index.size()));
+}
+
+std::uint32_t bigAt(const std::string& bytes, std::size_t place) {
+  std::uint32_t value = 0;
+  for (std::size_t i = 0; i < 4; ++i) value = value << 8 | static_cast<std::uint8_t>(bytes.at(place + i));
+  return value;
+}
+
+/// Writes the boxes of `movie` to `file`, each media data box `padding` bytes longer than it is.
+void writeSpread(const std::string& movie, std::uint32_t padding, const UniqueFd& file) {
+  std::uint64_t end = 0;
+  for (std::size_t start = 0; start < movie.size();) {
+    std::uint32_t length = bigAt(movie, start);
+    std::string bytes = movie.substr(start, length);
+    start += length;
+    if (bytes.substr(4, 4) == "mdat") bytes.replace(0, 4, test::big(length += padding, 4));
+    ASSERT_EQ(::pwrite(file.get(), bytes.data(), bytes.size(), static_cast<off_t>(end)),
+              static_cast<ssize_t>(bytes.size()));
+    end += length;
+  }
+  ASSERT_EQ(::ftruncate(file.get(), static_cast<off_t>(end)), 0);
+}
+
+TEST(MoviePropertiesTest, OfAMovieOfFragmentsLittleMoreThanTheirIndexesIsRead) {
+  constexpr int fragments = 1000;
+  const std::string movie = test::madeMovie(
+      {.container = "mp4",
+       .frames = fragments,
+       .muxerOptions = {{"movflags", "frag_keyframe+empty_moov+default_base_moof+skip_trailer"}}});
+  const test::TemporaryFolder folder;
+  const UniqueFd file(::open((folder / "MVI_0001.MP4").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+  ASSERT_NO_FATAL_FAILURE(writeSpread(movie, 1 << 20, file));
+  const CountingFile source(file);
+  const auto found = describeMovie(source);
+  ASSERT_TRUE(found);
+  EXPECT_NEAR(found->duration.value_or(0), fragments / 25.0, 0.1);
+  constexpr std::uint64_t atOnce = 4096;
+  EXPECT_LT(source.bytesRead, (fragments + 50) * atOnce);
+  EXPECT_LT(source.reads, fragments + 100u);
+  EXPECT_TRUE(firstFrameOf(source, {32, 0}));
+}
+
+TEST(MoviePropertiesTest, AnOrdinaryMovieTakesFewReads) {
+  for (const bool isIndexLast : {false, true}) {
+    TrackBytes track;
+    track.samples.assign(5000, std::string(100, 's'));
+    const CountingSource source(MovieBytes{.tracks = {track}, .isIndexLast = isIndexLast}.build());
+    ASSERT_TRUE(describeMovie(source));
+    EXPECT_LE(source.reads(), 6u) << isIndexLast;
+  }
 }
 
 /// Most memory that this process has had, in bytes.

@@ -23,8 +23,8 @@ class MovieReader {
  public:
   virtual ~MovieReader() = default;
 
-  /// None when the file is no movie, or none that can be read. Reads no more than the container's index and 2
-  /// MiB beside it.
+  /// None when the file is no movie, or none that can be read. Reads no more than the container's index, of
+  /// each of its parts at least 4 KiB, and 2 MiB beside it.
   virtual std::optional<MovieDescription> describe(const UniqueFd& file) = 0;
   /// A JPEG of the first picture of the first video track, within `maximum` and not larger than it is shown.
   /// The track's transform is not applied. None when there is no such picture.

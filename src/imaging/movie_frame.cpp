@@ -47,11 +47,13 @@ Care careFor(const VideoFormatDescription& format, Extent wanted) {
 
 /// A field of a picture, or what lies before the first edit, may come before the rest of it.
 constexpr std::size_t kMostShownPackets = 4;
+/// More than a minute of pictures that build on each other.
+constexpr std::size_t kMostPackets = 4096;
 
 /// Packets from one that needs no other up to the first, or the next few, that are shown.
 class Beginning {
  public:
-  /// False for one before the first that needs no other.
+  /// False for one that is not shown, or is before the first that needs no other.
   bool take(Packet packet) {
     if (packets_.empty() && (packet->flags & AV_PKT_FLAG_KEY) == 0) return false;
     const bool isShown = (packet->flags & AV_PKT_FLAG_DISCARD) == 0;
@@ -60,7 +62,7 @@ class Beginning {
     return isShown;
   }
   std::span<const Packet> packets() const { return packets_; }
-  bool isLongEnough() const { return shown_ == kMostShownPackets; }
+  bool isLongEnough() const { return shown_ == kMostShownPackets || packets_.size() == kMostPackets; }
 
  private:
   std::vector<Packet> packets_;
@@ -70,8 +72,9 @@ class Beginning {
 Frame firstPicture(MovieInput& input, Codec& codec) {
   Beginning beginning;
   while (Packet packet = input.next()) {
-    if (!beginning.take(std::move(packet))) continue;
-    if (Frame frame = codec.decodeFirst(beginning.packets())) return frame;
+    if (beginning.take(std::move(packet))) {
+      if (Frame frame = codec.decodeFirst(beginning.packets())) return frame;
+    }
     if (beginning.isLongEnough()) beginning = Beginning();
   }
   return codec.decodeFirst(beginning.packets());

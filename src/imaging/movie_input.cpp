@@ -113,11 +113,21 @@ void MovieInput::readOnly(const AVStream& stream) {
   for (AVStream* other : std::span(context_->streams, context_->nb_streams))
     other->discard = other == &stream ? AVDISCARD_DEFAULT : AVDISCARD_ALL;
   bytes_.left = kMostOfPackets;
+  packetBytesLeft_ = kMostOfPackets;
+}
+
+bool MovieInput::charge(const AVPacket& packet) {
+  constexpr std::uint64_t kPacketItself = 512;
+  const std::uint64_t cost = kPacketItself + static_cast<std::uint64_t>(packet.size);
+  if (cost > packetBytesLeft_) return false;
+  packetBytesLeft_ -= cost;
+  return true;
 }
 
 Packet MovieInput::next() {
   Packet packet(av_packet_alloc());
   while (packet && av_read_frame(context_, packet.get()) == 0) {
+    if (!charge(*packet)) return nullptr;
     // Covers, and what was read to find out about the streams, come whatever is discarded.
     if (packet->stream_index == wanted_) return packet;
     av_packet_unref(packet.get());

@@ -30,7 +30,8 @@ class MovieInput {
   /// complete as they get. Reads 2 MiB at most.
   void completeStreams();
 
-  /// Leaves all packets out but those of `stream`, and lets up to 64 MiB of them be read.
+  /// Leaves all packets out but those of `stream`, and lets up to 64 MiB be read, and as much come out of it:
+  /// packets may share bytes.
   void readOnly(const AVStream& stream);
   /// The next packet of that stream; null at the end, or when the limit is reached.
   Packet next();
@@ -53,6 +54,8 @@ class MovieInput {
 
   explicit MovieInput(const images::ByteSource& source) : bytes_{source} {}
   bool openContext();
+  /// Takes what a packet costs off what may still be given; false when that is not enough.
+  bool charge(const AVPacket& packet);
 
   static int readBytes(void* opaque, std::uint8_t* buffer, int size);
   static std::int64_t seekTo(void* opaque, std::int64_t offset, int whence);
@@ -63,6 +66,7 @@ class MovieInput {
   AVFormatContext* context_ = nullptr;
   bool isComplete_ = false;  ///< as far as it gets
   int wanted_ = -1;          ///< index of the stream whose packets are read
+  std::uint64_t packetBytesLeft_ = 0;
 };
 
 /// Its pictures are shown one after the other, and it is not a picture that stands for the movie.

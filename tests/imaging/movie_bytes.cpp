@@ -34,18 +34,23 @@ std::string soundEntry(const TrackBytes& track) {
              zeros(6) + big(1, 2) + zeros(8) + big(1, 2) + big(16, 2) + zeros(4) + big(8000, 2) + zeros(2));
 }
 
+std::size_t sampleCount(const TrackBytes& track) { return track.samples.size() * track.listings; }
+
 std::string sampleTable(const TrackBytes& track, std::uint64_t start) {
-  const std::size_t count = track.samples.size();
+  const std::size_t count = sampleCount(track);
   std::string lengths;
   std::string places;
   for (const std::string& sample : track.samples) {
-    lengths += big(sample.size(), 4);
-    places += big(start, 8);
+    for (std::size_t i = 0; i < track.listings; ++i) {
+      lengths += big(sample.size(), 4);
+      places += big(start, 8);
+    }
     start += sample.size();
   }
   const std::string entry = track.handler == "vide" ? visualEntry(track) : soundEntry(track);
+  const std::string whole = track.isFirstAloneWhole ? fullBox("stss", 0, 0, big(1, 4) + big(1, 4)) : "";
   return box("stbl", fullBox("stsd", 0, 0, big(1, 4) + entry) +
-                         fullBox("stts", 0, 0, big(1, 4) + big(count, 4) + big(1, 4)) +
+                         fullBox("stts", 0, 0, big(1, 4) + big(count, 4) + big(1, 4)) + whole +
                          fullBox("stsc", 0, 0, big(1, 4) + big(1, 4) + big(1, 4) + big(1, 4)) +
                          fullBox("stsz", 0, 0, zeros(4) + big(count, 4) + lengths) +
                          fullBox("co64", 0, 0, big(count, 4) + places));
@@ -54,7 +59,7 @@ std::string sampleTable(const TrackBytes& track, std::uint64_t start) {
 std::string trackBox(const TrackBytes& track, unsigned id, unsigned duration, std::uint64_t start) {
   const std::string handler = fullBox("hdlr", 0, 0, "mhlr" + std::string(track.handler) + zeros(13));
   const std::string header = fullBox(
-      "mdhd", 0, 0, zeros(8) + big(kTimeScale, 4) + big(track.samples.size(), 4) + big(0x55C4, 2) + zeros(2));
+      "mdhd", 0, 0, zeros(8) + big(kTimeScale, 4) + big(sampleCount(track), 4) + big(0x55C4, 2) + zeros(2));
   const std::string references = box("dinf", fullBox("dref", 0, 0, big(1, 4) + fullBox("url ", 0, 1, "")));
   const std::string media =
       box("mdia", header + handler + box("minf", references + sampleTable(track, start)));

@@ -27,6 +27,8 @@ struct TrackBytes {
   TrackMatrix matrix = matrixOf(1, 0, 0, 1);
   std::string entryBoxes = {};                                ///< such as clap and pasp
   std::vector<std::string> samples = {std::string(16, 's')};  ///< each one the whole picture
+  std::size_t listings = 1;                                   ///< how often the table has each sample
+  bool isFirstAloneWhole = false;                             ///< the others build on the first one
   std::string editBox = {};                                   ///< edts
 };
 

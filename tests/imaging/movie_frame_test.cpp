@@ -121,6 +121,34 @@ TEST(MovieFrameTest, PicturesBeforeTheFirstEditThatOthersBuildOnAreNotShown) {
   EXPECT_GT(luma(*later->frame, 32, 24), luma(*first->frame, 32, 24) + 10) << "each is brighter by 2";
 }
 
+TEST(MovieFrameTest, OfThousandsOfPicturesBeforeTheFirstEditNoneIsWaitedFor) {
+  const std::string sample = test::madeMovie({.container = "m4v", .encoder = "mpeg4", .frames = 1});
+  const auto shows = [&](unsigned start) {
+    const TrackBytes track{.format = "mp4v",
+                           .samples = {sample},
+                           .listings = start + 10,
+                           .isFirstAloneWhole = true,
+                           .editBox = test::editBox(10, start)};
+    return frameOf(MovieBytes{.tracks = {track}}.build()).has_value();
+  };
+  EXPECT_TRUE(shows(2000));
+  EXPECT_FALSE(shows(6000));
+}
+
+TEST(MovieFrameTest, PacketsThatShareTheirBytesHaveALimitToo) {
+  const std::string file =
+      MovieBytes{.tracks = {{.samples = {std::string(100, 's')}, .listings = 200'000}}}.build();
+  const MemorySource source(std::as_bytes(std::span(file)));
+  const auto input = MovieInput::open(source);
+  ASSERT_TRUE(input);
+  input->readOnly(*input->container().streams[0]);
+  std::size_t count = 0;
+  while (const Packet packet = input->next()) ++count;
+  constexpr std::size_t most = std::size_t{64} << 20;
+  EXPECT_GT(count, most / 1000);
+  EXPECT_LT(count, most / 500);
+}
+
 TEST(MovieFrameTest, OfSeveralVideoTracksTheFirstIsShown) {
   const MovieBytes movie{
       .tracks = {{.handler = "soun", .format = "sowt", .samples = {std::string(100, '\0')}},

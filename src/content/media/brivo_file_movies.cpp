@@ -30,12 +30,22 @@ constexpr const char* kMakerNote = "{MakerNorel}";
 constexpr std::array kPlaces{Place{"model", kTiff, "Model"}, Place{"software", kTiff, "Software"},
                              Place{"make", kTiff, "Make"}, Place{"identifier", kMakerNote, "17"}};
 
+/// `value` as UTF-8, without what is too long: the texts of every movie of a card stay in memory.
+std::string keptText(std::string_view value) {
+  constexpr std::size_t kMostBytes = 256;
+  const auto isInsideCharacter = [](char byte) { return (static_cast<unsigned char>(byte) & 0xC0) == 0x80; };
+  const std::string text = replacingInvalidUtf8(value);
+  std::size_t length = std::min(text.size(), kMostBytes);
+  while (length < text.size() && isInsideCharacter(text[length])) --length;
+  return text.substr(0, length);
+}
+
 Dictionary itemsFor(std::string_view dictionary, MovieAsset& asset) {
   Dictionary items;
   for (const auto& [commonKey, value] : asset.commonMetadata()) {
     for (const Place& place : kPlaces) {
       if (place.dictionary == dictionary && place.commonKey == commonKey)
-        items.set(place.key, replacingInvalidUtf8(value));
+        items.set(place.key, keptText(value));
     }
   }
   return items;

@@ -173,6 +173,23 @@ TEST_F(MoviesTest, TextThatIsNotUtf8IsMadeSo) {
   EXPECT_EQ(*metadataOf(*file).dictionary("{TIFF}")->string("Make"), "A\uFFFDMaker");
 }
 
+TEST_F(MoviesTest, OfLongTextTheWholeCharactersOf256BytesAreKept) {
+  const auto kept = [&](const std::string& make) {
+    const auto file = add(movieOf({TrackBytes{}}, test::keysBox({{"org.example.make", make}})));
+    return *metadataOf(*file).dictionary("{TIFF}")->string("Make");
+  };
+  const auto replacements = [](std::size_t count) {
+    std::string text;
+    while (count-- > 0) text += "\uFFFD";
+    return text;
+  };
+  EXPECT_EQ(kept(std::string(256, 'x')), std::string(256, 'x'));
+  EXPECT_EQ(kept(std::string(4000, 'x')), std::string(256, 'x'));
+  EXPECT_EQ(kept(std::string(4000, '\xFF')), replacements(85)) << "three bytes each";
+  EXPECT_EQ(kept(std::string(255, 'x') + "\u00E9"), std::string(255, 'x'));
+  EXPECT_EQ(kept(std::string(254, 'x') + "\u00E9"), std::string(254, 'x') + "\u00E9");
+}
+
 TEST_F(MoviesTest, SizesHaveTheShapeOfPixelsAndTheCleanAperture) {
   const auto file =
       add(movieOf({{.width = 320,

@@ -25,16 +25,31 @@ auto readOrNothing(Read read) -> decltype(read()) {
 MovieAsset::MovieAsset(MakingKey, MovieService& service, UniqueFd file)
     : service_(service), file_(std::move(file)), loaded_(promise_.get_future()) {}
 
-/// A task lets go of the asset, and with it of the file, before anyone hears that it has done its work.
 void MovieAsset::startLoading() {
   std::call_once(loading_, [&] {
-    service_.valueLane_->post([self = shared_from_this()]() mutable {
-      auto description = readOrNothing([&] { return self->service_.reader_.describe(self->file_); });
-      std::promise<Description> promise = std::move(self->promise_);
-      self.reset();
-      promise.set_value(std::move(description));
-    });
+    service_.valueLane_->post([self = shared_from_this()]() mutable { load(std::move(self)); });
   });
+}
+
+void MovieAsset::load(std::shared_ptr<MovieAsset> self) {
+  auto description = readOrNothing([&] { return self->service_.reader_.describe(self->file_); });
+  std::promise<Description> promise = std::move(self->promise_);
+  const std::vector<Completion> completions = self->endLoading();
+  self.reset();
+  promise.set_value(std::move(description));
+  for (const Completion& complete : completions) complete();
+}
+
+std::vector<MovieAsset::Completion> MovieAsset::endLoading() {
+  const MutexLock lock(mutex_);
+  hasEnded_ = true;
+  return std::exchange(completions_, {});
+}
+
+bool MovieAsset::willCall(Completion& completion) {
+  const MutexLock lock(mutex_);
+  if (!hasEnded_) completions_.push_back(std::move(completion));
+  return !hasEnded_;
 }
 
 const MovieAsset::Description& MovieAsset::description() {
@@ -44,9 +59,10 @@ const MovieAsset::Description& MovieAsset::description() {
 
 void MovieAsset::loadValuesAsynchronously(std::function<void()> completion) {
   startLoading();
-  // Behind the loading in the order of the lane, so this waits for one that runs already.
-  service_.valueLane_->post([self = shared_from_this(), completion = std::move(completion)]() mutable {
-    self->loaded_.wait();
+  if (willCall(completion)) return;
+  // Not in the lane, where it would be behind the loading of others.
+  service_.threads_.post([self = shared_from_this(), completion = std::move(completion)]() mutable {
+    self->loaded_.wait();  // the end of the loading is known a moment before the values are there
     self.reset();
     completion();
   });

@@ -8,6 +8,7 @@
 #include <optional>
 #include <vector>
 
+#include "platform/base/mutex.h"
 #include "platform/movies/movie_reader.h"
 
 namespace brivo {
@@ -27,7 +28,8 @@ class MovieAsset : public std::enable_shared_from_this<MovieAsset> {
   MovieAsset(MakingKey, MovieService& service, UniqueFd file);
 
   /// Calls `completion` when the values below can be had without waiting, on a thread of the service. Always,
-  /// whatever becomes of the file and of who reads it.
+  /// whatever becomes of the file and of who reads it, and without waiting for other movies when they have
+  /// been loaded.
   void loadValuesAsynchronously(std::function<void()> completion);
 
   ValueStatus statusOfDuration() { return description() && description()->duration ? kLoaded : kFailed; }
@@ -50,7 +52,15 @@ class MovieAsset : public std::enable_shared_from_this<MovieAsset> {
   static constexpr auto kLoaded = ValueStatus::loaded;
   static constexpr auto kFailed = ValueStatus::failed;
 
+  using Completion = std::function<void()>;
+
   void startLoading();
+  /// On a thread of the service. Lets go of `self`, and with it of the file, before anyone hears of the end.
+  static void load(std::shared_ptr<MovieAsset> self);
+  /// False when the loading has ended, and nobody would call it.
+  bool willCall(Completion& completion) BRIVO_EXCLUDES(mutex_);
+  /// Whom to call; from then on there is nobody.
+  std::vector<Completion> endLoading() BRIVO_EXCLUDES(mutex_);
   const Description& description();
 
   MovieService& service_;
@@ -58,6 +68,9 @@ class MovieAsset : public std::enable_shared_from_this<MovieAsset> {
   std::once_flag loading_;
   std::promise<Description> promise_;
   const std::shared_future<Description> loaded_;
+  Mutex mutex_;
+  bool hasEnded_ BRIVO_GUARDED_BY(mutex_) = false;
+  std::vector<Completion> completions_ BRIVO_GUARDED_BY(mutex_);
 };
 
 }  // namespace brivo

@@ -149,6 +149,71 @@ TEST_F(MovieServiceTest, NoDescriptorIsLeftWhenTheCallerHearsOfTheEnd) {
   }
 }
 
+/// Of the file "slow" it says nothing until it may.
+class SlowReader final : public MovieReader {
+ public:
+  std::optional<MovieDescription> describe(const UniqueFd& file) override {
+    char first = 0;
+    if (::pread(file.get(), &first, 1, 0) == 1 && first == 's') maySay.wait();
+    return MovieDescription();
+  }
+  std::optional<Data> firstFrame(const UniqueFd&, MaximumSize) override { return std::nullopt; }
+  std::latch maySay{1};
+};
+
+class LoadedMovieTest : public testing::Test {
+ protected:
+  ~LoadedMovieTest() override {
+    reader.maySay.count_down();
+    load(*slow);
+  }
+  SlowReader reader;
+  std::promise<void> completed;
+  MovieService service{reader, 1, 1};
+  const std::shared_ptr<MovieAsset> slow = service.open(fileWith("slow"));
+  const std::shared_ptr<MovieAsset> quick = service.open(fileWith("quick"));
+};
+
+TEST_F(LoadedMovieTest, ItsCompletionDoesNotWaitForTheLoadingOfOthers) {
+  (void)quick->videoTracks();
+  slow->loadValuesAsynchronously([] {});
+  quick->loadValuesAsynchronously([&] { completed.set_value(); });
+  EXPECT_EQ(completed.get_future().wait_for(seconds(5)), std::future_status::ready);
+}
+
+TEST_F(LoadedMovieTest, CompletionsRunWhereTheLoadingEnds) {
+  std::promise<void> mayEnd;
+  const auto first = service.open(fileWith("first"));
+  first->loadValuesAsynchronously([isTime = mayEnd.get_future().share()] { isTime.wait(); });
+  quick->loadValuesAsynchronously([] {});
+  slow->loadValuesAsynchronously([] {});
+  quick->loadValuesAsynchronously([&] { completed.set_value(); });  // asked for behind the slow one
+  mayEnd.set_value();
+  EXPECT_EQ(completed.get_future().wait_for(seconds(5)), std::future_status::ready);
+}
+
+TEST_F(LoadedMovieTest, EveryCompletionRunsOnceHoweverTheyMeetTheEnd) {
+  constexpr int rounds = 300;
+  constexpr int asking = 4;
+  for (int round = 0; round < rounds; ++round) {
+    const auto asset = service.open(fileWith("quick"));
+    std::atomic<int> calls = 0;
+    std::latch called(asking);
+    std::vector<std::thread> threads;
+    for (int i = 0; i < asking; ++i) {
+      threads.emplace_back([&] {
+        asset->loadValuesAsynchronously([&] {
+          if (asset->statusOfTracks() == Status::loaded) ++calls;
+          called.count_down();
+        });
+      });
+    }
+    for (std::thread& thread : threads) thread.join();
+    called.wait();
+    ASSERT_EQ(calls, asking);
+  }
+}
+
 TEST(MovieServiceThreadsTest, AFrameDoesNotWaitForValues) {
   struct Waiting final : MovieReader {
     std::optional<MovieDescription> describe(const UniqueFd&) override {

@@ -1,14 +1,11 @@
 // SPDX-License-Identifier: MIT
-extern "C" {
-#include <libavutil/mem.h>
-}
-
 #include <sys/mman.h>
 #include <unistd.h>
 
 #include <span>
 
 #include "check.h"
+#include "imaging/allocation_limit.h"
 #include "imaging/local_movie_reader.h"
 #include "platform/images/image_reader.h"
 
@@ -34,13 +31,9 @@ void checkJpeg(const brivo::Data& jpeg) {
 
 }  // namespace
 
-extern "C" int LLVMFuzzerInitialize(int*, char***) {
-  av_max_alloc(kMostMemory);
-  return 0;
-}
-
 // Movies: what is told of one can be told to another process, and a first frame is within its bounds.
 int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  const brivo::imaging::AllocationLimit limit(kMostMemory);
   const brivo::UniqueFd file = memoryFileWith(data, size);
   brivo::LocalMovieReader reader;
   if (const auto movie = reader.describe(file))

@@ -15,6 +15,7 @@ namespace brivo::imaging {
 
 namespace {
 
+constexpr std::size_t kMostAllocatedAtOnce = std::size_t{256} << 20;  // a table of 11 million samples
 constexpr std::uint64_t kMostOfIndex = std::uint64_t{512} << 20;
 constexpr std::uint64_t kMostOfStreams = 2'097'152;
 constexpr std::uint64_t kMostOfPackets = std::uint64_t{64} << 20;
@@ -34,12 +35,7 @@ AVInputFormat* const kAnyFormat = nullptr;
 
 }  // namespace
 
-MovieInput::AllocationLimit::AllocationLimit() {
-  constexpr std::size_t kMostAtOnce = std::size_t{256} << 20;  // a table of 11 million samples
-  av_max_alloc(kMostAtOnce);
-}
-
-MovieInput::AllocationLimit::~AllocationLimit() { av_max_alloc(std::numeric_limits<int>::max()); }
+MovieInput::MovieInput(const images::ByteSource& source) : limit_(kMostAllocatedAtOnce), bytes_{source} {}
 
 std::unique_ptr<MovieInput> MovieInput::open(const images::ByteSource& source) {
   std::unique_ptr<MovieInput> input(new MovieInput(source));

@@ -8,6 +8,7 @@ extern "C" {
 #include <cstdint>
 #include <memory>
 
+#include "imaging/allocation_limit.h"
 #include "imaging/codec.h"
 #include "platform/images/byte_source.h"
 
@@ -37,13 +38,6 @@ class MovieInput {
   Packet next();
 
  private:
-  /// Keeps what libavformat allocates at once small in this process: it believes the counts of a movie.
-  struct AllocationLimit {
-    AllocationLimit();
-    ~AllocationLimit();
-    AllocationLimit(const AllocationLimit&) = delete;
-    AllocationLimit& operator=(const AllocationLimit&) = delete;
-  };
   /// What libavformat reads from.
   struct Bytes {
     const images::ByteSource& source;
@@ -52,7 +46,7 @@ class MovieInput {
     bool isElsewhere = false;  ///< nothing has been read since a jump
   };
 
-  explicit MovieInput(const images::ByteSource& source) : bytes_{source} {}
+  explicit MovieInput(const images::ByteSource& source);
   bool openContext();
   /// Takes what a packet costs off what may still be given; false when that is not enough.
   bool charge(const AVPacket& packet);

@@ -44,6 +44,13 @@ TEST(VideoOrientationTest, WholeDegreesDecide) {
   EXPECT_EQ(videoOrientation({{{0, -1, 1, 0, 0, 0}, true, {}}}), 4u);
 }
 
+TEST(VideoOrientationTest, OfMirroredPicturesTheTurnOfTheUpperBorderCounts) {
+  EXPECT_EQ(videoOrientation({{{-1, 0, 0, 1, 640, 0}, true, {}}}), 8u) << "left to right";
+  EXPECT_EQ(videoOrientation({{{1, 0, 0, -1, 0, 480}, true, {}}}), 1u) << "top to bottom";
+  EXPECT_EQ(videoOrientation({{{0, 1, 1, 0, 0, 0}, true, {}}}), 6u) << "lines for columns";
+  EXPECT_EQ(videoOrientation({{{0, -1, -1, 0, 480, 640}, true, {}}}), 4u) << "and turned by half a turn";
+}
+
 TEST(VideoOrientationTest, AngleFractionsAreCutOff) {
   EXPECT_EQ(videoOrientation(turnedBy(89.9)), 1u);
   EXPECT_EQ(videoOrientation(turnedBy(90.4)), 6u);
@@ -117,6 +124,24 @@ TEST_F(MoviesTest, HalfATurnIsOrientation8WithWidthAndHeightSwapped) {
 
 TEST_F(MoviesTest, AQuarterTurnCounterClockwiseIsOrientation4) {
   expectShown(matrixOf(0, -1, 1, 0, 0, 640), 4, 640, 480);
+}
+
+TEST_F(MoviesTest, MirroredPicturesAreSwappedLikeTurnedOnes) {
+  expectShown(matrixOf(-1, 0, 0, 1, 640, 0), 8, 480, 640);
+  expectShown(matrixOf(1, 0, 0, -1, 0, 480), 1, 640, 480);
+  expectShown(matrixOf(0, 1, 1, 0), 6, 480, 640);
+}
+
+TEST_F(MoviesTest, WhereTheSizeIsSwappedTheDimensionsSayItToo) {
+  const Dictionary turnedOne = metadataOf(*add(movieOf({turned(matrixOf(0, 1, -1, 0, 480, 0))})));
+  for (const char* width : {"PixelWidth", "PixelXDimension"})
+    EXPECT_EQ(turnedOne.unsignedInteger(width), 480u) << width;
+  for (const char* height : {"PixelHeight", "PixelYDimension"})
+    EXPECT_EQ(turnedOne.unsignedInteger(height), 640u) << height;
+  const Dictionary upright = metadataOf(*add(movieOf({turned(matrixOf(1, 0, 0, 1))})));
+  EXPECT_EQ(upright.unsignedInteger("PixelWidth"), 640u);
+  EXPECT_FALSE(upright.find("PixelXDimension"));
+  EXPECT_FALSE(upright.find("PixelYDimension"));
 }
 
 TEST_F(MoviesTest, TheIdentityIsOrientation1) { expectShown(matrixOf(1, 0, 0, 1), 1, 640, 480); }
@@ -299,6 +324,16 @@ TEST_F(MoviesTest, A1920By1080MovieAskedForWidth160IsBoundedBy160By12960) {
   EXPECT_TRUE(thumbnailOf(*file, 160).data("thumb"));
   EXPECT_EQ(asked->reader.asked.width, 160u);
   EXPECT_EQ(asked->reader.asked.height, 12'960u);
+}
+
+TEST_F(MoviesTest, AskedForMoreThanItsWidthAMovieShowsLess) {
+  const auto thumbnailSize = [&](unsigned width, unsigned height, std::uint32_t wanted) {
+    const auto file = add(movieOf({{.width = width, .height = height}}));
+    return sizeOf(thumbnailOf(*file, wanted).data("thumb"));
+  };
+  EXPECT_EQ(thumbnailSize(1920, 1080, 1920), (images::PixelSize{1920, 1080}));
+  EXPECT_EQ(thumbnailSize(1920, 1080, 3840), (images::PixelSize{960, 540}));
+  EXPECT_EQ(thumbnailSize(320, 240, 1024), (images::PixelSize{100, 75}));
 }
 
 TEST_F(MoviesTest, AFolderOfSlowMoviesLetsOtherFoldersIn) {

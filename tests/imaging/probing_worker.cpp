@@ -211,7 +211,7 @@ class ProbingDecoder final : public ImageDecoder {
   }
 };
 
-/// Movies whose only metadata is the answer.
+/// Movies whose only metadata is the answer, as is the first frame of those with a command.
 class ProbingMovieReader final : public MovieReader {
  public:
   std::optional<MovieDescription> describe(const UniqueFd& file) override {
@@ -223,7 +223,9 @@ class ProbingMovieReader final : public MovieReader {
   }
 
   std::optional<Data> firstFrame(const UniqueFd& file, MaximumSize maximum) override {
-    if (contentOf(file).empty()) return std::nullopt;
+    const std::string text = contentOf(file);
+    if (text.empty()) return std::nullopt;
+    if (kCommands.contains(text)) return Data::copyOf(answerTo(text, file));
     return Data::copyOf(std::to_string(maximum.width) + " by " + std::to_string(maximum.height));
   }
 };

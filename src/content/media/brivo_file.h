@@ -141,8 +141,8 @@ class BrivoFile final : public BrivoItem, public ReadAheadSource {
   /// its size.
   std::optional<Data> thumbnailDataForPixelWidth(std::uint32_t width);
   std::optional<Data> imageThumbnailDataForPixelWidth(std::uint32_t width);
-  /// A JPEG of a movie's first frame, at most `width` pixels wide, and smaller than the frame when that is more
-  /// than it has; 0: in its size.
+  /// A JPEG of a movie's first frame, at most `width` pixels wide, and smaller than the frame when that is
+  /// more than it has; 0: in its size.
   std::optional<Data> movieThumbnailDataForPixelWidth(std::uint32_t width) const;
   /// The bytes of an embedded JPEG, unchanged; none when they are not in the file or do not begin as one.
   std::optional<Data> createThumbnailUsingOffsets(const SubImage& image);

@@ -303,5 +303,14 @@ TEST(MovieWorkersThatHangTest, AHangingMovieHoldsUpNoFrame) {
   end.wait();
 }
 
+TEST_F(MovieWorkersTest, EveryFrameEndsWhateverTheFileDoesToTheWorker) {
+  for (const char* command : {"crash", "hang", "throw", "exit", "say garbage"}) {
+    EXPECT_FALSE(frameOf(*service.open(fileWith(command)))) << command;
+    const auto frame = frameOf(*service.open(fileWith("movie")), {160, 90});
+    ASSERT_TRUE(frame) << command;
+    EXPECT_EQ(frame->text(), "160 by 90") << command;
+  }
+}
+
 }  // namespace
 }  // namespace brivo

@@ -127,7 +127,9 @@ class Service:
         return [target for target in self.targets() if target.startswith(path)]
 
     def targets(self):
-        """What the open descriptors are, without the timers that come with the first deadline."""
+        """What the open descriptors are once the first worker runs, without the timers that come with the first
+        deadline."""
+        wait_until(lambda: "imaging worker: " in self.log(), "the first worker")
         found = []
         for fd in self.descriptors():
             with contextlib.suppress(OSError):

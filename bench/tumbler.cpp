@@ -12,6 +12,7 @@
 #include "command.h"
 #include "figures.h"
 #include "platform/base/unique_fd.h"
+#include "support/raw_dbus.h"
 #include "support/wait.h"
 
 namespace brivo::bench {
@@ -57,7 +58,7 @@ void Tumbler::startBus() {
                         "DBUS_SESSION_BUS_ADDRESS=" + address, "GIO_USE_VFS=local"},
                        nowhere.get(),
                        nowhere.get()});
-  if (!test::waitUntil([&] { return std::filesystem::exists(socket); }))
+  if (!test::waitUntil([&] { return test::isListening(socket); }))
     throw std::runtime_error("dbus-daemon did not start");
   sd_bus* bus = nullptr;
   check(sd_bus_new(&bus));

@@ -7,20 +7,34 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <cstddef>
 #include <cstdio>
 #include <cstring>
 #include <stdexcept>
+#include <vector>
 
 namespace brivo::test {
 
-UniqueFd connectRaw(const std::string& path) {
+namespace {
+
+/// None, with errno, when nobody is there.
+UniqueFd tryToConnect(const std::string& path) {
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
   std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
   UniqueFd fd(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  if (::connect(fd.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
-    throw std::runtime_error("connect to " + path + ": " + std::strerror(errno));
-  }
+  if (::connect(fd.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) return {};
+  return fd;
+}
+
+}  // namespace
+
+bool isListening(const std::string& path) { return static_cast<bool>(tryToConnect(path)); }
+
+UniqueFd connectRaw(const std::string& path) {
+  UniqueFd fd = tryToConnect(path);
+  if (!fd) throw std::runtime_error("connect to " + path + ": " + std::strerror(errno));
   const timeval limit{10, 0};
   ::setsockopt(fd.get(), SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
   return fd;
@@ -82,11 +96,13 @@ std::string marshalledString(std::string_view text) {
 }
 
 std::string methodCall(std::uint32_t serial, std::string_view interface, std::string_view member,
-                       std::string_view signature, std::string_view body, std::uint32_t descriptors) {
+                       std::string_view signature, std::string_view body, std::uint32_t descriptors,
+                       std::string_view destination) {
   std::string fields(16, '\0');  // stands for what comes before, so that alignment comes out right
   appendField(fields, 1, 'o', "/org/orvid/brivod");
   appendField(fields, 2, 's', interface);
   appendField(fields, 3, 's', member);
+  if (!destination.empty()) appendField(fields, 6, 's', destination);
   if (!signature.empty()) appendField(fields, 8, 'g', signature);
   if (descriptors > 0) appendNumberField(fields, 9, descriptors);
   fields.erase(0, 16);
@@ -106,6 +122,24 @@ void sendAll(int fd, std::string_view bytes) {
     if (sent <= 0) return;  // the peer hung up; hangsUp() tells
     bytes.remove_prefix(static_cast<std::size_t>(sent));
   }
+}
+
+bool sendWithDescriptors(int fd, std::string bytes, std::size_t count) {
+  const std::vector<int> passed(count, STDOUT_FILENO);
+  const std::size_t size = count * sizeof(int);
+  std::vector<std::max_align_t> control(CMSG_SPACE(size) / sizeof(std::max_align_t) + 1);
+  iovec data{bytes.data(), bytes.size()};
+  msghdr header{};
+  header.msg_iov = &data;
+  header.msg_iovlen = 1;
+  header.msg_control = control.data();
+  header.msg_controllen = CMSG_SPACE(size);
+  cmsghdr* entry = CMSG_FIRSTHDR(&header);
+  entry->cmsg_level = SOL_SOCKET;
+  entry->cmsg_type = SCM_RIGHTS;
+  entry->cmsg_len = CMSG_LEN(size);
+  std::memcpy(CMSG_DATA(entry), passed.data(), size);
+  return ::sendmsg(fd, &header, MSG_NOSIGNAL) == static_cast<ssize_t>(bytes.size());
 }
 
 std::string receive(int fd, std::size_t size) {

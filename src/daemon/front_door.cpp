@@ -9,9 +9,7 @@ namespace {
 
 void openDevice(MSRemoteCameraDeviceManager& manager, const zeph::Visit& visit) {
   const std::string& uuid = *visit.arguments[0].get<std::string>();
-  if (!manager.remoteDeviceForUUID(uuid)) {
-    return visit.reply.fail({FrontDoor::kErrorUnknownDevice, "There is no device with this handle"});
-  }
+  if (!manager.remoteDeviceForUUID(uuid)) return visit.reply.fail(FrontDoor::unknownDevice());
   Dictionary properties = manager.openDevice(uuid);
   auto listener = manager.listenerOfDevice(uuid);
   if (!listener) return visit.reply.fail({zeph::kErrorFailed, "The device cannot be opened"});

@@ -18,6 +18,13 @@ class FrontDoor final : public zeph::Doorkeeper {
   /// The answer when no device has the UUID.
   static constexpr const char* kErrorUnknownDevice = "org.orvid.FrontDoor1.Error.UnknownDevice";
 
+  /// Bytes of a UUID in canonical form.
+  static constexpr std::size_t kLongestHandle = 36;
+  /// What the caller is told of a handle that no device has.
+  static zeph::CallError unknownDevice() {
+    return {kErrorUnknownDevice, "There is no device with this handle"};
+  }
+
   /// Opens devices on `mainLoop`, which must outlive this.
   FrontDoor(RunLoop& mainLoop, std::shared_ptr<zeph::Listener> managerListener,
             std::weak_ptr<MSRemoteCameraDeviceManager> manager)

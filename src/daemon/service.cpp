@@ -81,7 +81,8 @@ std::optional<SystemError> Service::listen() {
 
 void Service::openFrontDoor() {
   frontDoor_ = std::make_shared<FrontDoor>(mainLoop_, listener_, manager_);
-  connections_.openDoor({FrontDoor::kName, frontDoorProtocol(), frontDoor_,
+  connections_.openDoor({FrontDoor::kName, frontDoorProtocol(), FrontDoor::kLongestHandle,
+                         FrontDoor::unknownDevice(), frontDoor_,
                          [](const std::string& line) { OVLog("frontDoor", "{}", line); }});
 }
 

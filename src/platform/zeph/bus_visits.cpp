@@ -11,6 +11,7 @@
 
 #include "platform/zeph/bus_credentials.h"
 #include "platform/zeph/bus_vtable.h"
+#include "platform/zeph/call_receipt.h"
 #include "platform/zeph/value_codec.h"
 
 namespace brivo::zeph {
@@ -25,6 +26,17 @@ constexpr std::size_t kMostHanded = 64;
 
 int replyWithError(sd_bus_message* call, const CallError& error) {
   return sd_bus_reply_method_errorf(call, error.name.c_str(), "%s", error.text.c_str());
+}
+
+/// Says so without a copy of any. Leaves `call` to be read from its beginning.
+bool hasTextLongerThan(sd_bus_message* call, std::size_t most) {
+  const char* text = nullptr;
+  bool isLonger = false;
+  while (!isLonger && sd_bus_message_read_basic(call, 's', &text) > 0) {
+    isLonger = ::strnlen(text, most + 1) > most;
+  }
+  sd_bus_message_rewind(call, 1);
+  return isLonger;
 }
 
 /// Two connected ends; the first does not block.
@@ -42,9 +54,12 @@ Result<std::pair<UniqueFd, UniqueFd>, CallError> connectedPair() {
 
 /// A call from its arrival to its answer.
 struct BusVisits::Visitor {
-  Visitor(BusVisits& owner, std::uint64_t ordinal, sd_bus_message* message, const Member& called,
-          Arguments values)
-      : visits(owner), number(ordinal), call(message), member(called), arguments(std::move(values)) {}
+  Visitor(BusVisits& owner, std::uint64_t ordinal, BusMessage receipt, const Member& called, Arguments values)
+      : visits(owner),
+        number(ordinal),
+        call(std::move(receipt)),
+        member(called),
+        arguments(std::move(values)) {}
   ~Visitor() { sd_bus_slot_unref(question); }
   Visitor(const Visitor&) = delete;
   Visitor& operator=(const Visitor&) = delete;
@@ -62,7 +77,7 @@ struct BusVisits::Visitor {
 };
 
 BusVisits::BusVisits(RunLoop& loop, sd_bus* bus, const DoorPlan& plan)
-    : loop_(loop), bus_(bus), plan_(plan) {}
+    : loop_(&loop, [](RunLoop*) {}), bus_(bus), plan_(plan) {}
 
 BusVisits::~BusVisits() = default;
 
@@ -81,14 +96,19 @@ int BusVisits::start() {
 int BusVisits::onMethod(sd_bus_message* call, sd_bus_error* error) {
   const Member* member = plan_.protocol.withDBusName(sd_bus_message_get_member(call));
   const char* caller = sd_bus_message_get_sender(call);
+  if (!caller) return sd_bus_error_set(error, kErrorAccessDenied, "The bus does not say who calls");
+  if (hasTooMany(caller)) return sd_bus_error_set(error, kErrorLimitsExceeded, "Too many calls at once");
+  if (hasTextLongerThan(call, plan_.longestText)) {
+    return sd_bus_error_set(error, plan_.onLongerText.name.c_str(), plan_.onLongerText.text.c_str());
+  }
   auto arguments = readArguments(call, Descriptors::refused);
   if (!member || !arguments)
     return sd_bus_error_set(error, kErrorInvalidArgs, "An argument is not taken here");
-  if (!caller) return sd_bus_error_set(error, kErrorAccessDenied, "The bus does not say who calls");
-  if (hasTooMany(caller)) return sd_bus_error_set(error, kErrorLimitsExceeded, "Too many calls at once");
+  BusMessage receipt = receiptFor(call);
+  if (!receipt.get()) return -ENOMEM;
   const std::uint64_t number = ++lastNumber_;
   const auto visitor = visitors_.emplace(
-      number, std::make_unique<Visitor>(*this, number, call, *member, *std::move(arguments)));
+      number, std::make_unique<Visitor>(*this, number, std::move(receipt), *member, *std::move(arguments)));
   ask(*visitor.first->second, "GetConnectionCredentials", &BusVisits::credentialsTold);
   return 1;
 }
@@ -136,11 +156,14 @@ void BusVisits::ownerTold(Visitor& visitor, sd_bus_message* answer) {
 void BusVisits::letIn(Visitor& visitor) {
   const auto keeper = plan_.keeper.lock();
   if (!keeper) return refuse(visitor.number, {kErrorFailed, "The service is ending"});
-  const auto sink = [weak = weak_from_this(), number = visitor.number](Result<Passage, CallError> result) {
-    const auto self = weak.lock();
-    if (!self) return;
-    self->loop_.post([weak, number, result = std::move(result)]() mutable {
-      if (const auto visits = weak.lock()) visits->answered(number, std::move(result));
+  // What answers may be another thread, or what is left of the service: it must own neither the visits, which
+  // end on the I/O thread, nor expect the loop to be there.
+  const auto sink = [loop = std::weak_ptr(loop_), visits = weak_from_this(),
+                     number = visitor.number](Result<Passage, CallError> result) {
+    const auto there = loop.lock();
+    if (!there) return;
+    there->post([visits, number, result = std::move(result)]() mutable {
+      if (const auto self = visits.lock()) self->answered(number, std::move(result));
     });
   };
   keeper->visited({visitor.member.selector, std::move(visitor.arguments), ReplyOf<Passage>(sink)});
@@ -173,7 +196,7 @@ Result<UniqueFd, CallError> BusVisits::admit(const Visitor& visitor, const Passa
   return std::move(pair->second);
 }
 
-void BusVisits::hand(const Visitor& visitor, const UniqueFd& socket, const Arguments& values) {
+void BusVisits::hand(Visitor& visitor, const UniqueFd& socket, const Arguments& values) {
   BusMessage message;
   std::uint64_t cookie = 0;
   int result = sd_bus_message_new_method_return(visitor.call.get(), message.out());
@@ -184,7 +207,7 @@ void BusVisits::hand(const Visitor& visitor, const UniqueFd& socket, const Argum
     replyWithError(visitor.call.get(), {kErrorLimitsExceeded, std::strerror(-result)});
     return;
   }
-  handed_.emplace_back(cookie, BusMessage(visitor.call.get()));
+  handed_.emplace_back(cookie, std::move(visitor.call));
   if (handed_.size() > kMostHanded) handed_.pop_front();
 }
 

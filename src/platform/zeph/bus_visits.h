@@ -28,7 +28,7 @@ class BusVisits : public std::enable_shared_from_this<BusVisits> {
   /// Connections that one process has through the door at a time.
   static constexpr std::size_t kMostOfOneProcess = 64;
 
-  /// `bus` and `loop` must outlive this.
+  /// `loop`, `bus` and `plan` must outlive this.
   BusVisits(RunLoop& loop, sd_bus* bus, const DoorPlan& plan);
   ~BusVisits();
   BusVisits(const BusVisits&) = delete;
@@ -54,17 +54,18 @@ class BusVisits : public std::enable_shared_from_this<BusVisits> {
 
   void answered(std::uint64_t number, Result<Passage, CallError> result);
   Result<UniqueFd, CallError> admit(const Visitor& visitor, const Passage& passage);
-  void hand(const Visitor& visitor, const UniqueFd& socket, const Arguments& values);
+  void hand(Visitor& visitor, const UniqueFd& socket, const Arguments& values);
   void refuse(std::uint64_t number, const CallError& error);
 
-  RunLoop& loop_;
+  // Borrowed; shared so that answers can find out whether it is still there.
+  const std::shared_ptr<RunLoop> loop_;
   sd_bus* const bus_;
   const DoorPlan& plan_;
 
   std::uint64_t lastNumber_ = 0;
   std::map<std::uint64_t, std::unique_ptr<Visitor>> visitors_;
   std::map<std::int32_t, std::vector<std::weak_ptr<Connection>>> connections_;  // by process
-  // The last answers with a descriptor, for the bus may send one back.
+  // Receipts of the last calls that were answered with a descriptor, for the bus may send one back.
   std::deque<std::pair<std::uint64_t, BusMessage>> handed_;
 };
 

@@ -36,7 +36,8 @@ struct Visit {
 class Doorkeeper {
  public:
   virtual ~Doorkeeper() = default;
-  /// Runs on the I/O thread and must not block; the reply may be given later, on any thread.
+  /// Runs on the I/O thread and must not block; the reply may be given later, on any thread, but not while
+  /// another one destroys the connection service.
   virtual void visited(Visit visit) = 0;
 };
 
@@ -47,6 +48,9 @@ struct DoorPlan {
   /// Methods whose answer begins with a descriptor ("h"), served at kObjectPath. Lives as long as the
   /// program.
   const Protocol& protocol;
+  /// Of a text in a call, in bytes. A longer one is not read, and its caller gets the error.
+  std::size_t longestText = 0;
+  CallError onLongerText;
   /// Not owned; visits that find none are answered with an error.
   std::weak_ptr<Doorkeeper> keeper;
   /// Hears a line when the door opens, closes or cannot; called on the I/O thread, must not block.

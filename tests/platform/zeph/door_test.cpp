@@ -12,6 +12,7 @@
 #include "platform/zeph/bus_door.h"
 #include "support/environment.h"
 #include "support/message_bus.h"
+#include "support/raw_dbus.h"
 #include "support/wait.h"
 #include "zeph/echo_service.h"
 
@@ -21,7 +22,10 @@ namespace {
 using test::waitUntil;
 
 constexpr const char* kName = "org.example.Door";
-constexpr Member kDoorMembers[] = {{"Open", Member::Kind::method, "", "h", "socket,"}};
+constexpr Member kDoorMembers[] = {{"Open", Member::Kind::method, "", "h", "socket,"},
+                                   {"OpenNamed:", Member::Kind::method, "s", "h", "name,socket,"}};
+constexpr std::size_t kLongestName = 36;
+constexpr const char* kErrorTooLong = "org.example.Door1.Error.UnknownName";
 constexpr Protocol kDoorProtocol{"org.example.Door1", kDoorMembers};
 constexpr const char* kBus = "org.freedesktop.DBus";
 
@@ -50,6 +54,12 @@ class Caller {
               0);
     (void)nameHasOwner();
   }
+  void knockFor(const std::string& name) {
+    EXPECT_GE(sd_bus_call_method_async(bus_, nullptr, kName, kObjectPath, kDoorProtocol.interface,
+                                       kDoorMembers[1].dbusName().c_str(), onAnswer, this, "s", name.c_str()),
+              0);
+    (void)nameHasOwner();
+  }
   /// "socket" or the name of an error.
   std::string answer() {
     EXPECT_TRUE(waitUntil([&] {
@@ -74,6 +84,31 @@ class Caller {
   sd_bus* bus_ = nullptr;
   std::string answer_;
   UniqueFd socket_;  // the last one
+};
+
+/// A client that attaches descriptors to calls that have none in their signature.
+class Smuggler {
+ public:
+  static constexpr std::size_t kMostAtOnce = 16;  // of one message, for dbus-daemon
+
+  explicit Smuggler(const std::string& address) {
+    const std::string prefix = "unix:path=";
+    socket_ = test::connectRaw(address.substr(prefix.size(), address.find(',') - prefix.size()));
+    test::sendAll(socket_.get(), test::authentication());
+    // Not earlier: what comes in one read with the authentication loses its descriptors.
+    EXPECT_FALSE(test::receive(socket_.get(), 52).empty());
+    test::sendAll(socket_.get(), test::methodCall(++serial_, kBus, "Hello", "", "", 0, kBus));
+  }
+  void knock() {
+    EXPECT_TRUE(test::sendWithDescriptors(
+        socket_.get(),
+        test::methodCall(++serial_, kDoorProtocol.interface, "Open", "", "", kMostAtOnce, kName),
+        kMostAtOnce));
+  }
+
+ private:
+  UniqueFd socket_;
+  std::uint32_t serial_ = 0;
 };
 
 /// Sends everybody to one listener, at once or when it is told to.
@@ -110,7 +145,9 @@ struct DoorTest : EchoTest {
     EXPECT_TRUE(waitUntil([&] { return caller.nameHasOwner(); }));
   }
 
-  DoorPlan plan() const { return {kName, kDoorProtocol, keeper, nullptr}; }
+  DoorPlan plan() const {
+    return {kName, kDoorProtocol, kLongestName, {kErrorTooLong, "too long"}, keeper, nullptr};
+  }
 
   bool closed() {
     std::promise<bool> closed;
@@ -137,6 +174,58 @@ TEST_F(DoorTest, ACallThatNobodyAnswersIsAnErrorForItsCaller) {
   EXPECT_TRUE(waitUntil([&] { return keeper->visits == 1; }));
   keeper->letGo();
   EXPECT_EQ(caller.answer(), kErrorNoReply);
+}
+
+TEST_F(DoorTest, ATextThatIsLongerThanAnyNameIsAnErrorAndNeverSeenByTheKeeper) {
+  caller.knockFor(std::string(kLongestName + 1, 'x'));
+  EXPECT_EQ(caller.answer(), kErrorTooLong);
+  caller.knockFor(std::string(std::size_t{8} << 20, 'x'));
+  EXPECT_EQ(caller.answer(), kErrorTooLong);
+  EXPECT_EQ(keeper->visits, 0);
+  caller.knockFor(std::string(kLongestName, 'x'));
+  EXPECT_EQ(caller.answer(), "socket");
+}
+
+/// Sockets of connections and of the test itself; fewer than come with the calls.
+constexpr std::size_t kFew = 60;
+
+TEST_F(DoorTest, DescriptorsThatComeWithCallsAreClosedBeforeTheCallsAreAnswered) {
+  const std::size_t before = test::openDescriptorCount();
+  keeper->holds = true;
+  Smuggler smuggler(daemon.address());
+  constexpr int calls = BusVisits::kMostOfOneCaller;
+  for (int i = 0; i < calls; ++i) smuggler.knock();
+  ASSERT_TRUE(waitUntil([&] { return keeper->visits == calls; }));
+  EXPECT_TRUE(waitUntil([&] { return test::openDescriptorCount() < before + kFew; }));
+  keeper->letGo();
+}
+
+TEST_F(DoorTest, DescriptorsThatCameWithCallsAreNotKeptInCaseTheirAnswersComeBack) {
+  const std::size_t before = test::openDescriptorCount();
+  Smuggler smuggler(daemon.address());
+  for (int i = 1; i <= 8; ++i) {
+    smuggler.knock();
+    ASSERT_TRUE(waitUntil([&] { return keeper->visits == i; }));
+  }
+  EXPECT_TRUE(waitUntil([&] { return test::openDescriptorCount() < before + kFew; }));
+}
+
+TEST_F(DoorTest, AnAnswerIsHeardByNobodyWhenTheConnectionServiceHasGone) {
+  keeper->holds = true;
+  caller.knock();
+  EXPECT_TRUE(waitUntil([&] { return keeper->visits == 1; }));
+  connections.reset();
+  keeper->letGo();
+}
+
+TEST_F(DoorTest, AnswersOnOtherThreadsWhileTheBusGoesAwayAreForNobody) {
+  keeper->holds = true;
+  for (std::size_t i = 0; i < BusVisits::kMostOfOneCaller; ++i) caller.knock();
+  EXPECT_TRUE(waitUntil([&] { return keeper->visits == static_cast<int>(BusVisits::kMostOfOneCaller); }));
+  std::thread other([&] { keeper->letGo(); });
+  daemon.end();
+  other.join();
+  EXPECT_TRUE(closed()) << "the I/O thread goes on";
 }
 
 TEST_F(DoorTest, AListenerThatHasEndedIsAnErrorForItsCaller) {

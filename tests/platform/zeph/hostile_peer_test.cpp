@@ -19,6 +19,7 @@ using test::hangsUp;
 using test::methodCall;
 using test::receive;
 using test::sendAll;
+using test::sendWithDescriptors;
 using test::waitUntil;
 using testing::HasSubstr;
 
@@ -191,25 +192,6 @@ TEST_F(HostilePeerTest, TenThousandQuickConnectionsLeaveNoDescriptor) {
   EXPECT_TRUE(waitUntil([&] { return test::openDescriptorCount() <= before; }));
 }
 
-/// Sends one descriptor along with `bytes`; false when the kernel refuses it for the receiver's
-/// sake.
-bool sendWithDescriptor(int socket, std::string bytes) {
-  iovec data{bytes.data(), bytes.size()};
-  alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
-  msghdr header{};
-  header.msg_iov = &data;
-  header.msg_iovlen = 1;
-  header.msg_control = control;
-  header.msg_controllen = sizeof control;
-  cmsghdr* entry = CMSG_FIRSTHDR(&header);
-  entry->cmsg_level = SOL_SOCKET;
-  entry->cmsg_type = SCM_RIGHTS;
-  entry->cmsg_len = CMSG_LEN(sizeof(int));
-  const int passed = STDOUT_FILENO;
-  std::memcpy(CMSG_DATA(entry), &passed, sizeof passed);
-  return ::sendmsg(socket, &header, MSG_NOSIGNAL) > 0;
-}
-
 TEST_F(HostilePeerTest, DescriptorsWithoutAMessageThatMentionsThemAreNotKept) {
   const std::size_t before = test::openDescriptorCount();
   const std::string ping = methodCall(1, "org.freedesktop.DBus.Peer", "Ping");
@@ -217,7 +199,7 @@ TEST_F(HostilePeerTest, DescriptorsWithoutAMessageThatMentionsThemAreNotKept) {
     const UniqueFd raw = connectRaw(socketPath());
     sendAll(raw.get(), authentication());
     ASSERT_THAT(receive(raw.get(), 52), HasSubstr("AGREE_UNIX_FD"));
-    if (sendWithDescriptor(raw.get(), ping)) GTEST_SKIP() << "this kernel cannot refuse descriptors";
+    if (sendWithDescriptors(raw.get(), ping, 1)) GTEST_SKIP() << "this kernel cannot refuse descriptors";
     sendAll(raw.get(), ping);
     EXPECT_EQ(receive(raw.get(), 40).size(), 40u) << "the connection goes on";
   }

@@ -181,10 +181,15 @@ void BusLink::turn() {
 }
 
 int BusLink::step() {
+  if (sieve_ && reading_ && hasReadAll_) {
+    const int moved = sieve_->move();
+    if (moved < 0) return moved;
+  }
   const int result = sd_bus_process(bus_, nullptr);
   if (result < 0 || sieved_ < 0) return result;
   if (!sieve_) return sd_bus_is_ready(bus_) > 0 ? openSieve() : result;
-  return result == 0 && reading_ ? sieve_->move() : result;
+  hasReadAll_ = result == 0;  // what the socket has still wakes us again
+  return result;
 }
 
 int BusLink::openSieve() {

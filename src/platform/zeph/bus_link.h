@@ -81,7 +81,7 @@ class BusLink {
 
   /// Lets sd-bus work for a while, then fills it up again and says when to continue.
   void turn();
-  /// One step of sd-bus, or what comes next from the socket: positive when there may be more to do.
+  /// One step of sd-bus, with what comes next from the socket: positive when there may be more to do.
   int step();
   int openSieve();
   void refill();
@@ -126,7 +126,8 @@ class BusLink {
   UniqueFd watched_;
   int sieved_ = -1;  // what sd-bus reads from, of sd-bus, when a sieve has to stand before it
   std::unique_ptr<DescriptorSieve>
-      sieve_;  // once the peer has authenticated; before, sd-bus takes no descriptors
+      sieve_;                // once the peer has authenticated; before, sd-bus takes no descriptors
+  bool hasReadAll_ = false;  // of what came through the sieve
   sd_event_source* io_ = nullptr;
   sd_event_source* timer_ = nullptr;
   sd_event_source* again_ = nullptr;

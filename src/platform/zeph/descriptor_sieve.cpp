@@ -8,6 +8,7 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
+#include <span>
 
 #include "platform/zeph/pass_rights.h"
 
@@ -21,8 +22,10 @@ constexpr std::size_t kChunk = 32768;
 /// Bytes, and the descriptors that come with them.
 class Chunk {
  public:
-  explicit Chunk(std::size_t mostDescriptors)
-      : controlSize_(mostDescriptors > 0 ? CMSG_SPACE(mostDescriptors * sizeof(int)) : 0) {}
+  /// The bytes go to `memory`.
+  Chunk(std::span<std::byte> memory, std::size_t mostDescriptors)
+      : controlSize_(mostDescriptors > 0 ? CMSG_SPACE(mostDescriptors * sizeof(int)) : 0),
+        data_{memory.data(), memory.size()} {}
   ~Chunk() {
     for (std::size_t i = 0; i < descriptors(); ++i) ::close(descriptor(i));
   }
@@ -56,9 +59,8 @@ class Chunk {
   }
 
   const std::size_t controlSize_;
-  std::array<std::byte, kChunk> bytes_;
-  alignas(cmsghdr) std::array<std::byte, CMSG_SPACE(DescriptorSieve::kMostStray * sizeof(int))> control_;
-  iovec data_{bytes_.data(), bytes_.size()};
+  alignas(cmsghdr) std::array<std::byte, CMSG_SPACE(DescriptorSieve::kMostStray * sizeof(int))> control_{};
+  iovec data_;
   msghdr header_{nullptr, 0, &data_, 1, nullptr, 0, 0};
 };
 
@@ -83,7 +85,8 @@ DescriptorSieve::DescriptorSieve(int socket, UniqueFd outlet, bool takesAny)
     : socket_(socket), outlet_(std::move(outlet)), mostStray_(takesAny ? kMostStray : 0) {}
 
 int DescriptorSieve::move() {
-  Chunk chunk(mostStray_);
+  thread_local std::array<std::byte, kChunk> memory{};
+  Chunk chunk(memory, mostStray_);
   const ssize_t size = chunk.receive(socket_);
   if (size == 0) return -ECONNRESET;
   if (size < 0) return errno == EAGAIN || errno == EINTR ? 0 : -errno;

@@ -51,8 +51,10 @@ RunLoop::~RunLoop() {
 
 void RunLoop::run() {
   sd_event_loop(event_);
+  watches_.clear();
   std::deque<Task> dropped;
   const MutexLock lock(mutex_);
+  ended_ = true;
   dropped.swap(posted_);
 }
 
@@ -64,6 +66,7 @@ void RunLoop::post(Task task) {
   bool wasEmpty = false;
   {
     const MutexLock lock(mutex_);
+    if (ended_) return;
     wasEmpty = posted_.empty();
     posted_.push_back(std::move(task));
   }

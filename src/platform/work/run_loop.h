@@ -26,8 +26,8 @@ class RunLoop {
   RunLoop(const RunLoop&) = delete;
   RunLoop& operator=(const RunLoop&) = delete;
 
-  /// Serves events until quit(), and drops what was posted and has not run by then. The calling thread is the
-  /// loop's thread from then on.
+  /// Serves events until quit(), and drops what was posted and has not run by then, and what is posted later.
+  /// The calling thread is the loop's thread from then on. Once only.
   void run();
   /// Makes run() return after the current task. *Thread-safe.*
   void quit();
@@ -55,6 +55,7 @@ class RunLoop {
 
   Mutex mutex_;
   std::deque<Task> posted_ BRIVO_GUARDED_BY(mutex_);
+  bool ended_ BRIVO_GUARDED_BY(mutex_) = false;
 };
 
 }  // namespace brivo

@@ -18,9 +18,10 @@ constexpr std::chrono::milliseconds kLongestWait = std::chrono::hours(24 * 365);
 
 }  // namespace
 
-BusConnection::BusConnection(RunLoop& loop, std::shared_ptr<SerialQueue> queue, ConnectionObserver& observer,
-                             UniqueFd socket, BusLink::Role role, AuditToken peer)
-    : loop_(loop),
+BusConnection::BusConnection(std::shared_ptr<RunLoop> loop, std::shared_ptr<SerialQueue> queue,
+                             ConnectionObserver& observer, UniqueFd socket, BusLink::Role role,
+                             AuditToken peer)
+    : loop_(std::move(loop)),
       queue_(std::move(queue)),
       observer_(observer),
       role_(role),
@@ -48,11 +49,11 @@ std::shared_ptr<BusConnection> BusConnection::self() {
 }
 
 void BusConnection::resume() {
-  loop_.post([self = self()] { self->start(); });
+  loop_->post([self = self()] { self->start(); });
 }
 
 void BusConnection::invalidate() {
-  loop_.post([self = self()] { self->end(End::invalidated, ""); });
+  loop_->post([self = self()] { self->end(End::invalidated, ""); });
 }
 
 // ------------------------------------------------------------------------------------------------ any thread
@@ -84,7 +85,7 @@ bool BusConnection::enqueue(Outgoing message) {
   waitingBytes_ += message.weight;
   if (waitingMessages_ > kMostWaitingMessages || waitingBytes_ > kMostWaitingBytes) {
     if (over_.exchange(true)) return false;
-    loop_.post([self = self()] {
+    loop_->post([self = self()] {
       self->end(End::invalidated, fmt::format("leaves {} messages of {} bytes unread",
                                               self->waitingMessages_.load(), self->waitingBytes_.load()));
     });
@@ -110,7 +111,7 @@ void BusConnection::wake() {
 }
 
 void BusConnection::flushOnLoop() {
-  loop_.post([self = self()] {
+  loop_->post([self = self()] {
     {
       const MutexLock lock(self->mutex_);
       self->linkWoken_ = false;
@@ -131,7 +132,7 @@ void BusConnection::whenNotBacklogged(Task task) {
     waiters_.push_back(std::move(task));
     if (waiters_.size() > 1) return;
   }
-  loop_.post([self = self()] { self->watchBacklog(); });
+  loop_->post([self = self()] { self->watchBacklog(); });
 }
 
 void BusConnection::runWaiters() {
@@ -151,7 +152,7 @@ Reply BusConnection::replyFor(std::uint64_t token) {
       self->enqueue({OutgoingAnswer{token, std::move(answer)}, size});
     }
     if (self->callsInWork_-- == kMostCallsInWork) {
-      self->loop_.post([self] { self->callFinished(); });
+      self->loop_->post([self] { self->callFinished(); });
     }
   });
 }
@@ -161,7 +162,7 @@ Reply BusConnection::replyFor(std::uint64_t token) {
 void BusConnection::start() {
   if (ended_ || link_ || !exported_ || !remote_) return;
   auto link =
-      BusLink::open(loop_.event(), std::move(socket_), role_, takesBuffers_, *exported_, *remote_, *this);
+      BusLink::open(loop_->event(), std::move(socket_), role_, takesBuffers_, *exported_, *remote_, *this);
   if (!link.ok()) {
     const bool hungUp = BusLink::isHangUp(link.error());
     return end(End::interrupted,
@@ -205,7 +206,7 @@ void BusConnection::discardLink() {
     std::shared_ptr<BusConnection> owner;  // outlives the link, which still answers its calls
     std::unique_ptr<BusLink> link;
   };
-  loop_.post([remains = std::make_shared<Remains>(Remains{self(), std::move(link_)})] {});
+  loop_->post([remains = std::make_shared<Remains>(Remains{self(), std::move(link_)})] {});
   for (Outgoing& message : takeOutgoing(kMostWaitingMessages)) {
     if (auto* call = std::get_if<OutgoingCall>(&message.message)) {
       answered(std::move(call->onAnswer), CallError{kErrorDisconnected, "The connection ended"});
@@ -258,7 +259,7 @@ void BusConnection::watchBacklog() {
     if (waiters_.empty()) return;
   }
   if (!isBacklogged()) return runWaiters();
-  loop_.postAfter(kStallTime / 4, [self = self()] { self->watchBacklog(); });
+  loop_->postAfter(kStallTime / 4, [self = self()] { self->watchBacklog(); });
 }
 
 void BusConnection::ended(const std::string& why) {

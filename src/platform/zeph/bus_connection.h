@@ -41,8 +41,8 @@ class BusConnection final : public Connection, private LinkOwner {
   static constexpr std::size_t kMostCallsInWork = 256;
 
   /// `loop` and `observer` must outlive the connection's end.
-  BusConnection(RunLoop& loop, std::shared_ptr<SerialQueue> queue, ConnectionObserver& observer,
-                UniqueFd socket, BusLink::Role role, AuditToken peer);
+  BusConnection(std::shared_ptr<RunLoop> loop, std::shared_ptr<SerialQueue> queue,
+                ConnectionObserver& observer, UniqueFd socket, BusLink::Role role, AuditToken peer);
   ~BusConnection() override;
 
   const AuditToken& auditToken() const override { return peer_; }
@@ -91,7 +91,7 @@ class BusConnection final : public Connection, private LinkOwner {
   void ended(const std::string& why) override;
   std::string peerName() const;
 
-  RunLoop& loop_;
+  const std::shared_ptr<RunLoop> loop_;  // its service may end before the last task that needs this
   const std::shared_ptr<SerialQueue> queue_;
   ConnectionObserver& observer_;
   const BusLink::Role role_;

@@ -20,7 +20,8 @@ enum NameAnswer : std::uint32_t { primaryOwner = 1, inQueue = 2, alreadyOwner = 
 
 }  // namespace
 
-BusDoor::BusDoor(RunLoop& loop, DoorPlan plan) : loop_(loop), plan_(std::move(plan)) {}
+BusDoor::BusDoor(std::shared_ptr<RunLoop> loop, DoorPlan plan)
+    : loop_(std::move(loop)), plan_(std::move(plan)) {}
 
 BusDoor::~BusDoor() { leaveBus(); }
 
@@ -43,7 +44,7 @@ int BusDoor::connect() {
   const auto onGone = [](sd_bus_message*, void* self, sd_bus_error*) {
     auto* door = static_cast<BusDoor*>(self);
     // Not here: a handler of the connection is running.
-    door->loop_.post([weak = door->weak_from_this()] {
+    door->loop_->post([weak = door->weak_from_this()] {
       if (const auto gone = weak.lock()) gone->lost();
     });
     return 0;
@@ -52,7 +53,7 @@ int BusDoor::connect() {
                                      nullptr, this);
   visits_ = std::make_shared<BusVisits>(loop_, bus_, plan_);
   if (result >= 0) result = visits_->start();
-  return result < 0 ? result : sd_bus_attach_event(bus_, loop_.event(), SD_EVENT_PRIORITY_NORMAL);
+  return result < 0 ? result : sd_bus_attach_event(bus_, loop_->event(), SD_EVENT_PRIORITY_NORMAL);
 }
 
 void BusDoor::takeName() {
@@ -113,7 +114,7 @@ void BusDoor::lost() {
 }
 
 void BusDoor::retryLater() {
-  loop_.postAfter(retry_, [weak = weak_from_this()] {
+  loop_->postAfter(retry_, [weak = weak_from_this()] {
     if (const auto self = weak.lock()) self->open();
   });
   retry_ = std::min(retry_ * 2, kLastRetry);

@@ -20,8 +20,7 @@ class BusDoor : public std::enable_shared_from_this<BusDoor> {
   static constexpr std::chrono::milliseconds kFirstRetry{500};
   static constexpr std::chrono::milliseconds kLastRetry{60'000};
 
-  /// `loop` must outlive the door.
-  BusDoor(RunLoop& loop, DoorPlan plan);
+  BusDoor(std::shared_ptr<RunLoop> loop, DoorPlan plan);
   ~BusDoor();
   BusDoor(const BusDoor&) = delete;
   BusDoor& operator=(const BusDoor&) = delete;
@@ -49,7 +48,7 @@ class BusDoor : public std::enable_shared_from_this<BusDoor> {
   void say(const std::string& line);
   void answerGiveUp(bool given);
 
-  RunLoop& loop_;
+  const std::shared_ptr<RunLoop> loop_;
   const DoorPlan plan_;
   bool ended_ = false;
   std::chrono::milliseconds retry_ = kFirstRetry;

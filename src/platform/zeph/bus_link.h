@@ -15,7 +15,7 @@
 
 #include "platform/base/result.h"
 #include "platform/base/unique_fd.h"
-#include "platform/zeph/bus_message.h"
+#include "platform/bus/bus_message.h"
 #include "platform/zeph/descriptor_sieve.h"
 #include "platform/zeph/outgoing.h"
 #include "platform/zeph/protocol.h"

@@ -58,9 +58,9 @@ void BusListener::refuseDescriptors(const UniqueFd& socket) {
   ::setsockopt(socket.get(), SOL_SOCKET, SO_PASSRIGHTS, &no, sizeof no);
 }
 
-BusListener::BusListener(RunLoop& loop, ListenerHost& host, std::shared_ptr<SerialQueue> queue,
-                         UniqueFd socket, std::string path, bool ownsFile)
-    : loop_(loop),
+BusListener::BusListener(std::shared_ptr<RunLoop> loop, ListenerHost& host,
+                         std::shared_ptr<SerialQueue> queue, UniqueFd socket, std::string path, bool ownsFile)
+    : loop_(std::move(loop)),
       host_(host),
       queue_(std::move(queue)),
       path_(std::move(path)),
@@ -76,14 +76,15 @@ void BusListener::setDelegate(std::weak_ptr<ListenerDelegate> delegate) {
 }
 
 void BusListener::resume() {
-  loop_.post([self = shared_from_this()] {
+  loop_->post([self = shared_from_this()] {
     if (!self->socket_ || self->source_) return;
     self->listening_ = self;
     const auto onConnect = [](sd_event_source*, int, std::uint32_t, void* listener) {
       static_cast<BusListener*>(listener)->accept();
       return 0;
     };
-    sd_event_add_io(self->loop_.event(), &self->source_, self->socket_.get(), EPOLLIN, onConnect, self.get());
+    sd_event_add_io(self->loop_->event(), &self->source_, self->socket_.get(), EPOLLIN, onConnect,
+                    self.get());
   });
 }
 
@@ -93,7 +94,7 @@ void BusListener::invalidate() {
     if (std::exchange(fileIsGone_, true)) return;
   }
   if (ownsFile_) ::unlink(path_.c_str());
-  loop_.post([self = shared_from_this()] {
+  loop_->post([self = shared_from_this()] {
     if (self->isHidden_) ::unlink(hiddenName(self->path_).c_str());
     self->source_ = sd_event_source_disable_unref(self->source_);
     self->socket_.reset();
@@ -126,7 +127,7 @@ void BusListener::accept() {
     } else if (errno == EMFILE || errno == ENFILE || errno == ENOMEM || errno == ENOBUFS) {
       host_.fault(fmt::format("cannot accept a connection: {}", std::strerror(errno)));
       setAccepting(false);
-      loop_.postAfter(kPauseWithoutDescriptors, [self = shared_from_this()] { self->setAccepting(true); });
+      loop_->postAfter(kPauseWithoutDescriptors, [self = shared_from_this()] { self->setAccepting(true); });
       return;
     } else if (errno != EINTR && errno != ECONNABORTED) {
       return;
@@ -159,7 +160,7 @@ std::shared_ptr<Connection> BusListener::letDecide(UniqueFd socket, const AuditT
   auto connection = host_.adopt(std::move(socket), peer);
   queue_->post([self = shared_from_this(), connection] {
     if (!self->decide(connection)) connection->invalidate();
-    self->loop_.post([self] { self->decided(); });
+    self->loop_->post([self] { self->decided(); });
   });
   return connection;
 }

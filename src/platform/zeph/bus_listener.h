@@ -39,8 +39,8 @@ class BusListener final : public Listener, public std::enable_shared_from_this<B
 
   /// `socket` listens. The socket file is removed with the listener when `ownsFile`. `loop` and
   /// `host` must outlive the listener.
-  BusListener(RunLoop& loop, ListenerHost& host, std::shared_ptr<SerialQueue> queue, UniqueFd socket,
-              std::string path, bool ownsFile);
+  BusListener(std::shared_ptr<RunLoop> loop, ListenerHost& host, std::shared_ptr<SerialQueue> queue,
+              UniqueFd socket, std::string path, bool ownsFile);
   ~BusListener() override;
 
   const Endpoint& endpoint() const override { return endpoint_; }
@@ -65,7 +65,7 @@ class BusListener final : public Listener, public std::enable_shared_from_this<B
 
   bool decide(const std::shared_ptr<Connection>& connection) BRIVO_EXCLUDES(mutex_);
 
-  RunLoop& loop_;
+  const std::shared_ptr<RunLoop> loop_;  // its service may end before the last task that needs this
   ListenerHost& host_;
   const std::shared_ptr<SerialQueue> queue_;
   const std::string path_;

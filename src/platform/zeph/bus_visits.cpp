@@ -76,8 +76,8 @@ struct BusVisits::Visitor {
   sd_bus_slot* question = nullptr;
 };
 
-BusVisits::BusVisits(RunLoop& loop, sd_bus* bus, const DoorPlan& plan)
-    : loop_(&loop, [](RunLoop*) {}), bus_(bus), plan_(plan) {}
+BusVisits::BusVisits(std::shared_ptr<RunLoop> loop, sd_bus* bus, const DoorPlan& plan)
+    : loop_(std::move(loop)), bus_(bus), plan_(plan) {}
 
 BusVisits::~BusVisits() = default;
 
@@ -156,13 +156,11 @@ void BusVisits::ownerTold(Visitor& visitor, sd_bus_message* answer) {
 void BusVisits::letIn(Visitor& visitor) {
   const auto keeper = plan_.keeper.lock();
   if (!keeper) return refuse(visitor.number, {kErrorFailed, "The service is ending"});
-  // What answers may be another thread, or what is left of the service: it must own neither the visits, which
-  // end on the I/O thread, nor expect the loop to be there.
-  const auto sink = [loop = std::weak_ptr(loop_), visits = weak_from_this(),
+  // What answers may be another thread, or what is left of the service: it must not own the visits, which end
+  // on the I/O thread.
+  const auto sink = [loop = loop_, visits = weak_from_this(),
                      number = visitor.number](Result<Passage, CallError> result) {
-    const auto there = loop.lock();
-    if (!there) return;
-    there->post([visits, number, result = std::move(result)]() mutable {
+    loop->post([visits, number, result = std::move(result)]() mutable {
       if (const auto self = visits.lock()) self->answered(number, std::move(result));
     });
   };

@@ -28,8 +28,8 @@ class BusVisits : public std::enable_shared_from_this<BusVisits> {
   /// Connections that one process has through the door at a time.
   static constexpr std::size_t kMostOfOneProcess = 64;
 
-  /// `loop`, `bus` and `plan` must outlive this.
-  BusVisits(RunLoop& loop, sd_bus* bus, const DoorPlan& plan);
+  /// `bus` and `plan` must outlive this.
+  BusVisits(std::shared_ptr<RunLoop> loop, sd_bus* bus, const DoorPlan& plan);
   ~BusVisits();
   BusVisits(const BusVisits&) = delete;
   BusVisits& operator=(const BusVisits&) = delete;
@@ -57,7 +57,6 @@ class BusVisits : public std::enable_shared_from_this<BusVisits> {
   void hand(Visitor& visitor, const UniqueFd& socket, const Arguments& values);
   void refuse(std::uint64_t number, const CallError& error);
 
-  // Borrowed; shared so that answers can find out whether it is still there.
   const std::shared_ptr<RunLoop> loop_;
   sd_bus* const bus_;
   const DoorPlan& plan_;

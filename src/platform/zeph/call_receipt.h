@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
-#include "platform/zeph/bus_message.h"
+#include "platform/bus/bus_message.h"
 
 namespace brivo::zeph {
 

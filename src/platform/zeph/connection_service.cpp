@@ -49,17 +49,17 @@ ConnectionService::ConnectionService(Pool& pool, FaultHandler onFault)
     : pool_(pool), onFault_(std::move(onFault)), thread_([this] {
         setThreadName("io");
         const LogRing ring;  // a blocked reader of the log must not stop every client
-        loop_.run();
+        loop_->run();
       }) {}
 
 ConnectionService::~ConnectionService() {
-  loop_.post([this] {
+  loop_->post([this] {
     for (const auto& weak : listeners_) {
       if (const auto listener = weak.lock()) listener->invalidate();
     }
     for (const auto& connection : connections_) connection->invalidate();
     if (door_) door_->end();
-    loop_.post([this] { loop_.quit(); });  // after what ending them posts
+    loop_->post([this] { loop_->quit(); });  // after what ending them posts
   });
   thread_.join();
 }
@@ -69,7 +69,7 @@ std::shared_ptr<BusListener> ConnectionService::makeListener(UniqueFd socket, st
   auto listener =
       std::make_shared<BusListener>(loop_, static_cast<ListenerHost&>(*this), SerialQueue::create(pool_),
                                     std::move(socket), std::move(path), ownsFile);
-  loop_.post([this, weak = std::weak_ptr(listener)] {
+  loop_->post([this, weak = std::weak_ptr(listener)] {
     std::erase_if(listeners_, [](const auto& one) { return one.expired(); });
     listeners_.push_back(weak);
   });
@@ -118,19 +118,19 @@ Result<std::shared_ptr<Connection>> ConnectionService::connect(const Endpoint& e
   auto connection = std::make_shared<BusConnection>(loop_, SerialQueue::create(pool_),
                                                     static_cast<ConnectionObserver&>(*this),
                                                     std::move(socket), BusLink::Role::client, peer);
-  loop_.post([this, connection] { connections_.insert(connection); });
+  loop_->post([this, connection] { connections_.insert(connection); });
   return std::shared_ptr<Connection>(std::move(connection));
 }
 
 void ConnectionService::openDoor(DoorPlan plan) {
-  loop_.post([this, plan = std::move(plan)] {
+  loop_->post([this, plan = std::move(plan)] {
     door_ = std::make_shared<BusDoor>(loop_, plan);
     door_->open();
   });
 }
 
 void ConnectionService::stopAcceptingIfIdle(std::function<void(bool idle)> answer) {
-  loop_.post([this, answer = std::move(answer)] {
+  loop_->post([this, answer = std::move(answer)] {
     for (const auto& weak : listeners_) {
       if (const auto listener = weak.lock()) listener->stopAccepting();
     }
@@ -141,7 +141,7 @@ void ConnectionService::stopAcceptingIfIdle(std::function<void(bool idle)> answe
 }
 
 void ConnectionService::closeDoorIfIdle(std::function<void(bool idle)> answer) {
-  loop_.post([this, answer = std::move(answer)] {
+  loop_->post([this, answer = std::move(answer)] {
     const auto closed = [this, answer](bool isClosed) {
       const bool idle = isClosed && isIdle();
       if (!idle) goOn();

@@ -72,7 +72,7 @@ class ConnectionService final : private ListenerHost, private ConnectionObserver
   Pool& pool_;
   const FaultHandler onFault_;
   std::atomic<bool> activated_ = false;
-  RunLoop loop_;
+  const std::shared_ptr<RunLoop> loop_ = std::make_shared<RunLoop>();
 
   // I/O thread.
   std::set<std::shared_ptr<Connection>> connections_;

@@ -415,5 +415,29 @@ TEST_F(EchoTest, TheSocketFileGoesWithTheListener) {
   EXPECT_NE(::access(path.c_str(), F_OK), 0);
 }
 
+/// Takes its time with the decision.
+class SlowDelegate : public ListenerDelegate {
+ public:
+  bool shouldAcceptNewConnection(Listener&, const std::shared_ptr<Connection>& connection) override {
+    asked.set_value();
+    mayDecide.get_future().wait();
+    connection->resume();
+    return true;
+  }
+
+  std::promise<void> asked, mayDecide;
+};
+
+TEST_F(EchoTest, ADecisionThatComesAfterTheEndOfTheServiceDoesNoHarm) {
+  const auto delegate = std::make_shared<SlowDelegate>();
+  listener->setDelegate(delegate);
+  const auto client = connectClient();
+  delegate->asked.get_future().wait();
+  connections.reset();
+  delegate->mayDecide.set_value();
+  pool.waitUntilIdle();
+  client->invalidate();
+}
+
 }  // namespace
 }  // namespace brivo::zeph

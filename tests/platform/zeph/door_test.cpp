@@ -257,26 +257,26 @@ TEST_F(DoorTest, ACallInWorkAndAConnectionKeepTheDoorOpen) {
 
 TEST_F(DoorTest, CallsThatWereMadeBeforeTheNameIsGivenUpHaveBeenReadByThenAndAreAnswered) {
   ASSERT_TRUE(closed());
-  RunLoop loop;
+  const auto loop = std::make_shared<RunLoop>();
   const auto door = std::make_shared<BusDoor>(loop, plan());
   keeper->holds = true;
-  std::thread thread([&] { loop.run(); });
-  loop.post([&] { door->open(); });
+  std::thread thread([&] { loop->run(); });
+  loop->post([&] { door->open(); });
   EXPECT_TRUE(waitUntil([&] { return caller.nameHasOwner(); }));
   std::promise<std::size_t> inWork;
-  loop.post([&] {
+  loop->post([&] {
     caller.knock();  // the loop cannot read it meanwhile
     door->giveNameUp([&](bool given) { inWork.set_value(given ? door->visitsInWork() : 99); });
   });
   EXPECT_EQ(inWork.get_future().get(), 1u);
   EXPECT_FALSE(caller.nameHasOwner());
-  loop.post([&] { door->takeNameAgain(); });
+  loop->post([&] { door->takeNameAgain(); });
   EXPECT_TRUE(waitUntil([&] { return caller.nameHasOwner(); }));
   EXPECT_TRUE(waitUntil([&] { return keeper->visits == 1; }));
   keeper->letGo();
   EXPECT_EQ(caller.answer(), kErrorNoReply) << "the service has read it, and its keeper has answered";
-  loop.post([&] { door->end(); });
-  loop.quit();
+  loop->post([&] { door->end(); });
+  loop->quit();
   thread.join();
 }
 

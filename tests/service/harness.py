@@ -128,13 +128,13 @@ class Service:
 
     def targets(self):
         """What the open descriptors are once the first worker runs, without the timers that come with the first
-        deadline."""
+        deadline and the processes that have been decided about: those that have ended go with the next decision."""
         wait_until(lambda: "imaging worker: " in self.log(), "the first worker")
         found = []
         for fd in self.descriptors():
             with contextlib.suppress(OSError):
                 found.append(os.readlink(f"/proc/{self.process.pid}/fd/{fd}"))
-        return [target for target in found if target != "anon_inode:[timerfd]"]
+        return [target for target in found if target not in ("anon_inode:[timerfd]", "anon_inode:[pidfd]")]
 
     def threads(self):
         """The names of its threads."""

@@ -12,7 +12,6 @@
 #include "platform/bus/bus_message.h"
 #include "platform/zeph/bus_driver.h"
 #include "platform/zeph/bus_vtable.h"
-#include "platform/zeph/call_receipt.h"
 #include "platform/zeph/pass_rights.h"
 #include "platform/zeph/value_codec.h"
 
@@ -23,10 +22,7 @@ namespace {
 constexpr int kMessagesPerTurn = 64;
 constexpr std::size_t kMostInBus = 32;
 
-std::string errorText(int code) {
-  if (code == -ETOOMANYREFS) return "more descriptors than are taken";
-  return std::strerror(code < 0 ? -code : code);
-}
+std::string errorText(int code) { return std::strerror(code < 0 ? -code : code); }
 
 /// One identity of the service's end for all connections of the process.
 sd_id128_t serverIdentity() {
@@ -73,7 +69,7 @@ BusLink::BusLink(sd_event* event, Role role, bool takesBuffers, const Interface&
 
 BusLink::~BusLink() {
   for (sd_event_source* source : {io_, timer_, again_}) sd_event_source_disable_unref(source);
-  callsToAnswer_.clear();
+  for (const auto& [token, call] : callsToAnswer_) sd_bus_message_unref(call.message);
   for (const auto& [key, call] : callsToHear_) {
     owner_.answered(std::move(call->onAnswer), CallError{kErrorDisconnected, "The connection ended"});
   }
@@ -97,15 +93,12 @@ int BusLink::start(UniqueFd socket) {
   }
   watched_ = socket.duplicate();
   if (!watched_) return -errno;
-  // What is read from can be exchanged later when it is not what is written to.
-  UniqueFd output;
-  const bool isSieved = role_ == Role::service && DescriptorSieve::isNeededFor(socket.get());
-  if (isSieved && !(output = socket.duplicate())) return -errno;
-  result = sd_bus_set_fd(bus_, socket.get(), output ? output.get() : socket.get());
-  if (result < 0) return result;
-  const int input = socket.release();  // sd-bus closes them from here on
-  if (isSieved) sieved_ = input;
-  (void)output.release();
+  const int fd = socket.release();  // sd-bus closes it from here on
+  result = sd_bus_set_fd(bus_, fd, fd);
+  if (result < 0) {
+    UniqueFd close(fd);
+    return result;
+  }
   sd_bus_negotiate_fds(bus_, 1);
   if (role_ == Role::service) {
     sd_bus_set_server(bus_, 1, serverIdentity());
@@ -169,7 +162,7 @@ void BusLink::turn() {
   // then.
   int result = reading_ || queuedInBus() > 0 ? 1 : 0;
   for (int i = 0; i < kMessagesPerTurn && result > 0 && (reading_ || i == 0); ++i) {
-    result = step();
+    result = sd_bus_process(bus_, nullptr);
   }
   if (result < 0) {
     return end(isHangUp(result) ? "" : errorText(result));
@@ -178,25 +171,6 @@ void BusLink::turn() {
   refill();
   if (role_ == Role::client && peerIsSilent()) giveUpLateCalls();
   rearm();
-}
-
-int BusLink::step() {
-  if (sieve_ && reading_ && hasReadAll_) {
-    const int moved = sieve_->move();
-    if (moved < 0) return moved;
-  }
-  const int result = sd_bus_process(bus_, nullptr);
-  if (result < 0 || sieved_ < 0) return result;
-  if (!sieve_) return sd_bus_is_ready(bus_) > 0 ? openSieve() : result;
-  hasReadAll_ = result == 0;  // what the socket has still wakes us again
-  return result;
-}
-
-int BusLink::openSieve() {
-  auto sieve = DescriptorSieve::open(watched_.get(), sieved_, takesBuffers_);
-  if (!sieve.ok()) return sieve.error();
-  sieve_ = *std::move(sieve);
-  return 1;
 }
 
 void BusLink::end(const std::string& why) {
@@ -235,7 +209,7 @@ bool BusLink::batch(const Outgoing& next) {
 }
 
 bool BusLink::writeBatch() {
-  const SignalBatch::Written written = batch_.writeTo(watched_.get());
+  const SignalBatch::Written written = batch_.writeTo(sd_bus_get_fd(bus_));
   const SignalBatch::Left left = batch_.takeLeft();
   if (left.messages > 0) owner_.left(left.messages, left.weight);
   if (written == SignalBatch::Written::hungUp) end("");
@@ -334,16 +308,14 @@ int BusLink::put(const OutgoingSignal& signal) {
 int BusLink::put(OutgoingAnswer& answer) {
   const auto found = callsToAnswer_.find(answer.token);
   if (found == callsToAnswer_.end()) return 0;
-  const CallToAnswer asked = std::move(found->second);
+  const auto [call, member] = found->second;
   callsToAnswer_.erase(found);
-  sd_bus_message* const call = asked.receipt.get();
   int result = 0;
   if (answer.answer.ok()) {
     BusMessage message;
     result = sd_bus_message_new_method_return(call, message.out());
     if (result >= 0) {
-      result =
-          appendArguments(message.get(), asked.member->out, answer.answer.value(), peerTakesDescriptors());
+      result = appendArguments(message.get(), member->out, answer.answer.value(), peerTakesDescriptors());
     }
     if (result >= 0) result = sd_bus_send(bus_, message.get(), nullptr);
     if (result < 0) {
@@ -354,6 +326,7 @@ int BusLink::put(OutgoingAnswer& answer) {
     const CallError& error = answer.answer.error();
     result = sd_bus_reply_method_errorf(call, error.name.c_str(), "%s", error.text.c_str());
   }
+  sd_bus_message_unref(call);
   return result;
 }
 
@@ -431,7 +404,7 @@ int BusLink::onMessage(sd_bus_message* message) {
   if (member->kind != Member::Kind::signal || !sd_bus_message_is_signal(message, nullptr, nullptr)) return 0;
   auto arguments = readArguments(message, Descriptors::asData);
   if (arguments && sd_bus_message_has_signature(message, member->in)) {
-    return receive(*member, std::move(*arguments), message);
+    receive(*member, std::move(*arguments), message);
   }
   return 1;
 }
@@ -440,25 +413,22 @@ int BusLink::onMessage(sd_bus_message* message) {
 int BusLink::onMethod(sd_bus_message* message, sd_bus_error* error) {
   const Member* member = exported_.protocol().withDBusName(sd_bus_message_get_member(message));
   auto arguments = readArguments(message, takesBuffers_ ? Descriptors::asBuffers : Descriptors::refused);
-  if (sieve_ && arguments && holdsBuffer(*arguments)) sieve_->taken();
   if (!member || !arguments ||
       (!arguments->empty() &&
        !exported_.admits(arguments->front(), member->selector, Interface::Origin::argument))) {
     return sd_bus_error_set(error, kErrorInvalidArgs, "An argument has a type that is not taken here");
   }
-  return receive(*member, std::move(*arguments), message);
+  receive(*member, std::move(*arguments), message);
+  return 1;
 }
 
-int BusLink::receive(const Member& member, Arguments arguments, sd_bus_message* message) {
+void BusLink::receive(const Member& member, Arguments arguments, sd_bus_message* message) {
   std::uint64_t token = 0;
   if (member.kind == Member::Kind::method && sd_bus_message_get_expect_reply(message) > 0) {
-    BusMessage receipt = receiptFor(message);
-    if (!receipt.get()) return -ENOMEM;
     token = ++lastToken_;
-    callsToAnswer_.emplace(token, CallToAnswer{std::move(receipt), &member});
+    callsToAnswer_.emplace(token, CallToAnswer{sd_bus_message_ref(message), &member});
   }
   owner_.received(member, std::move(arguments), token);
-  return 1;
 }
 
 }  // namespace brivo::zeph

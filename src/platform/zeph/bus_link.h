@@ -15,8 +15,6 @@
 
 #include "platform/base/result.h"
 #include "platform/base/unique_fd.h"
-#include "platform/bus/bus_message.h"
-#include "platform/zeph/descriptor_sieve.h"
 #include "platform/zeph/outgoing.h"
 #include "platform/zeph/protocol.h"
 #include "platform/zeph/signal_batch.h"
@@ -70,7 +68,7 @@ class BusLink {
  private:
   struct PendingCall;
   struct CallToAnswer {
-    BusMessage receipt;
+    sd_bus_message* message;
     const Member* member;
   };
 
@@ -81,9 +79,6 @@ class BusLink {
 
   /// Lets sd-bus work for a while, then fills it up again and says when to continue.
   void turn();
-  /// One step of sd-bus, with what comes next from the socket: positive when there may be more to do.
-  int step();
-  int openSieve();
   void refill();
   void rearm();
   void end(const std::string& why);
@@ -111,7 +106,7 @@ class BusLink {
   int onMessage(sd_bus_message* message);
   int onMethod(sd_bus_message* message, sd_bus_error* error);
   void onAnswer(PendingCall& call, sd_bus_message* message);
-  int receive(const Member& member, Arguments arguments, sd_bus_message* message);
+  void receive(const Member& member, Arguments arguments, sd_bus_message* message);
 
   const Role role_;
   const bool takesBuffers_;
@@ -124,10 +119,6 @@ class BusLink {
   // sd-bus closes its descriptor when the peer hangs up. A process that is being started may hold the socket
   // a moment longer, and what the event loop watches has to be taken from it before that.
   UniqueFd watched_;
-  int sieved_ = -1;  // what sd-bus reads from, of sd-bus, when a sieve has to stand before it
-  std::unique_ptr<DescriptorSieve>
-      sieve_;                // once the peer has authenticated; before, sd-bus takes no descriptors
-  bool hasReadAll_ = false;  // of what came through the sieve
   sd_event_source* io_ = nullptr;
   sd_event_source* timer_ = nullptr;
   sd_event_source* again_ = nullptr;

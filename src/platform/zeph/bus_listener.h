@@ -34,7 +34,8 @@ class BusListener final : public Listener, public std::enable_shared_from_this<B
   /// clients and never the other way.
   static Result<UniqueFd> bind(const std::string& path);
   /// Makes the kernel refuse descriptors that peers of the listening `socket` send (SO_PASSRIGHTS,
-  /// Linux 6.16). Elsewhere it does nothing, and a DescriptorSieve stands in.
+  /// Linux 6.16): libsystemd 252 leaks those that come with a malformed message. Elsewhere it does
+  /// nothing.
   static void refuseDescriptors(const UniqueFd& socket);
 
   /// `socket` listens. The socket file is removed with the listener when `ownsFile`. `loop` and

@@ -152,8 +152,8 @@ class Connection : public std::enable_shared_from_this<Connection> {
   /// Runs after invalidate(), or when the peer left too much unread.
   virtual void setInvalidationHandler(Task handler) = 0;
 
-  /// Lets the peer lend memory: a descriptor in a call arrives as SharedBuffer. Without it such calls are
-  /// refused, and so, where the kernel can, is their sending; elsewhere it ends the connection.
+  /// Lets the peer lend memory: descriptors in its calls arrive as SharedBuffer. Without it such calls are
+  /// refused, and so, where the kernel can, is their sending.
   virtual void acceptBuffers() = 0;
   /// Starts talking.
   virtual void resume() = 0;

@@ -4,7 +4,6 @@
 #include <fcntl.h>
 #include <systemd/sd-bus.h>
 
-#include <algorithm>
 #include <span>
 
 #include "platform/zeph/value_writer.h"
@@ -15,7 +14,6 @@ namespace {
 
 constexpr int kDeepest = 32;
 constexpr std::size_t kMostValues = 100'000;
-constexpr std::size_t kMostBuffers = 1;     // each is a descriptor of its own, and no call takes more
 constexpr std::size_t kMostEntries = 1024;  // of one dictionary; its lookups are linear
 
 /// Appends to a message of sd-bus.
@@ -158,7 +156,6 @@ class Reader {
 
   std::optional<Value> descriptorAndSize() {
     if (descriptors_ == Descriptors::refused) return std::nullopt;
-    if (descriptors_ == Descriptors::asBuffers && ++buffers_ > kMostBuffers) return std::nullopt;
     return inside('r', "ht", [&]() -> std::optional<Value> {
       const auto fd = basic<int>('h');  // borrowed from the message
       const auto size = basic<std::uint64_t>('t');
@@ -174,7 +171,6 @@ class Reader {
   sd_bus_message* message_;
   Descriptors descriptors_;
   std::size_t count_ = 0;
-  std::size_t buffers_ = 0;
 };
 
 std::size_t weightOf(const Value& value) {
@@ -194,15 +190,6 @@ std::size_t weightOf(const Value& value) {
   return kPerValue;
 }
 
-bool isOrHoldsBuffer(const Value& value) {
-  if (value.get<SharedBuffer>()) return true;
-  if (const auto* array = value.get<Array>())
-    return std::any_of(array->begin(), array->end(), isOrHoldsBuffer);
-  const auto* dictionary = value.get<Dictionary>();
-  return dictionary && std::any_of(dictionary->begin(), dictionary->end(),
-                                   [](const auto& entry) { return isOrHoldsBuffer(entry.second); });
-}
-
 }  // namespace
 
 int appendArguments(sd_bus_message* message, const char* signature, std::span<const Value> values,
@@ -213,10 +200,6 @@ int appendArguments(sd_bus_message* message, const char* signature, std::span<co
 
 std::optional<Arguments> readArguments(sd_bus_message* message, Descriptors descriptors) {
   return Reader(message, descriptors).all();
-}
-
-bool holdsBuffer(std::span<const Value> values) {
-  return std::any_of(values.begin(), values.end(), isOrHoldsBuffer);
 }
 
 std::size_t weight(std::span<const Value> values) {

@@ -20,7 +20,7 @@ inline constexpr std::size_t kDescriptorThreshold = 65536;
 enum class Descriptors {
   refused,
   asData,     ///< a sealed memory file is mapped and read
-  asBuffers,  ///< anything becomes a SharedBuffer, unlooked at; one in a message
+  asBuffers,  ///< anything becomes a SharedBuffer, unlooked at
 };
 
 /// Appends one value per complete type of `signature`. Negative errno on failure: a value of a
@@ -32,9 +32,6 @@ int appendArguments(sd_bus_message* message, const char* signature, std::span<co
 /// The values of a whole message. None when it holds a type that has no value, is nested too deeply, holds
 /// more values than any honest message, or descriptors that are not taken. I/O thread.
 std::optional<Arguments> readArguments(sd_bus_message* message, Descriptors descriptors);
-
-/// Whether there is a SharedBuffer among `values`, at any depth.
-bool holdsBuffer(std::span<const Value> values);
 
 /// About how many bytes `values` occupy while they wait to be sent, the memory behind data
 /// included.

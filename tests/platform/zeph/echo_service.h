@@ -23,7 +23,6 @@ inline constexpr const char* kEchoInterface = "org.example.Echo";
 inline constexpr Member kEchoMembers[] = {
     {"echo:withReply:", Member::Kind::method, "a{sv}", "a{sv}", "value,answer,"},
     {"typed:names:withReply:", Member::Kind::method, "sas", "t", "text,names,count,"},
-    {"keep:withReply:", Member::Kind::method, "a{sv}", "a{sv}", "value,answer,"},
     {"hold", Member::Kind::method, "", "a{sv}", "answer,"},
     {"fetch", Member::Kind::method, "", "a{sv}", "answer,"},
     {"drop", Member::Kind::method, "", "a{sv}", "answer,"},
@@ -36,7 +35,7 @@ inline constexpr Protocol kEchoProtocol{kEchoInterface, kEchoMembers};
 inline const ClassSet kAllClasses{Value::Class::number, Value::Class::string, Value::Class::data,
                                   Value::Class::array, Value::Class::dictionary};
 
-/// Answers "echo" with what it got, keeps the replies of "hold" and "keep", drops those of "drop".
+/// Answers "echo" with what it got, keeps the replies of "hold", drops those of "drop".
 class EchoService : public ListenerDelegate, public ExportedObject {
  public:
   bool shouldAcceptNewConnection(Listener&, const std::shared_ptr<Connection>& connection) override {
@@ -47,7 +46,6 @@ class EchoService : public ListenerDelegate, public ExportedObject {
     connection->setExportedInterface(exported);
     connection->setRemoteObjectInterface(Interface(kEchoProtocol));
     connection->setExportedObject(self);
-    if (acceptsBuffers) connection->acceptBuffers();
     connection->setInterruptionHandler([this] { ++interrupted; });
     connection->setInvalidationHandler([this] { ++invalidated; });
     {
@@ -65,7 +63,7 @@ class EchoService : public ListenerDelegate, public ExportedObject {
       return invocation.reply({std::uint64_t{invocation.arguments[1].get<Array>()->size()}});
     }
     if (invocation.selector == "fetch") return invocation.reply({Dictionary{{"data", data}}});
-    if (invocation.selector == "hold" || invocation.selector == "keep:withReply:") {
+    if (invocation.selector == "hold") {
       const std::lock_guard lock(mutex);
       held.push_back(std::move(invocation.reply));
     }
@@ -79,7 +77,6 @@ class EchoService : public ListenerDelegate, public ExportedObject {
   Data data;  ///< what "fetch" answers
   std::weak_ptr<EchoService> self;
   std::atomic<bool> refuse = false;
-  std::atomic<bool> acceptsBuffers = false;
   std::atomic<int> asked = 0;
   std::atomic<int> handled = 0;
   std::atomic<int> interrupted = 0;
